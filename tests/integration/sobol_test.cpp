@@ -223,18 +223,29 @@ TEST(SobolRun, SaysHowItsDistributionsAndConstraintsFitToTheBounds) {
 }
 
 TEST(SobolRun, OtherBootstrapSamplesAndLimitsTakeAllResultsOver) {
-  const std::string settings = "Sample_Size = 32\nBootstrap_Samples = 300\nNegligible_Index = 0.1";
+  const std::string groups = "Sample_Size = 32\nGroup = 'first: a'\nGroup = 'other: b'";
+  const std::string settings = groups + "\nBootstrap_Samples = 300\nNegligible_Index = 0.1";
   const ModelFolder fresh;
   ASSERT_EQ(runProgram({sobolSetup(fresh, settings)}).exitCode, 0);
   const ModelFolder folder;
-  ASSERT_EQ(runProgram({sobolSetup(folder, "Sample_Size = 32")}).exitCode, 0);
+  ASSERT_EQ(runProgram({sobolSetup(folder, groups)}).exitCode, 0);
   const std::string setup = sobolSetup(folder, settings);
   folder.editSetup("Restart = 0", "Restart = 1");
   const ProgramResult run = runProgram({setup});
   ASSERT_EQ(run.exitCode, 0) << run.error;
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n128 of them were taken from the earlier run\n"));
-  EXPECT_EQ(sobolCell(folder.read("basin_Sobol.dat"), {"objective", "fit", "a", "", "total"}, "Upper"),
-            sobolCell(fresh.read("basin_Sobol.dat"), {"objective", "fit", "a", "", "total"}, "Upper"));
+  EXPECT_EQ(sobolCell(folder.read("basin_Sobol.dat"), {"objective", "fit", "first", "", "total"}, "Upper"),
+            sobolCell(fresh.read("basin_Sobol.dat"), {"objective", "fit", "first", "", "total"}, "Upper"));
+}
+
+TEST(SobolRun, ThatEndsAsTooManyRunsFailSaysWhatItWouldWarnOf) {
+  const SobolFunctionFolder folder("g", 8, 0.0, 1.0, "Sample_Size = 64");
+  folder.write("model/parameters.tpl", folder.read("model/parameters.tpl") + "fail-share = 0.4\n");
+  EXPECT_EQ(folder.run().exitCode, 1);
+  const char* warning = "Note: [0-9]+ % of the model runs failed. Failures at random widen the limits";
+  for (const char* file : {"basin.log", "basin_Sensitivity.dat"}) {
+    EXPECT_THAT(folder.read(file), ::testing::ContainsRegex(warning)) << file;
+  }
 }
 
 }  // namespace

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <numeric>
 
 #include <boost/math/distributions/students_t.hpp>
 
@@ -28,8 +29,12 @@ class SobolSums {
   void addTotal(std::size_t factor, double term) { add(3 + 2 * (factors_ + factor), term); }
   void addPair(std::size_t pair, double term) { add(3 + 2 * (2 * factors_ + pair), term); }
 
-  void addTimes(double count, const SobolSums& other) {
-    for (std::size_t i = 0; i < numbers_.size(); ++i) numbers_[i] += count * other.numbers_[i];
+  void addTimes(double count, const SobolSums& other) { addRange(count, other, 0, numbers_.size()); }
+  /// Of the pairs only some.
+  void addTimes(double count, const SobolSums& other, std::size_t firstPair, std::size_t endPair) {
+    const std::size_t pairs = 3 + 4 * factors_;
+    addRange(count, other, 0, pairs);
+    addRange(count, other, pairs + 2 * firstPair, pairs + 2 * endPair);
   }
   void clear() { std::ranges::fill(numbers_, 0.0); }
 
@@ -44,6 +49,9 @@ class SobolSums {
     if (std::isnan(term)) return;
     numbers_[at] += term;
     numbers_[at + 1] += 1.0;
+  }
+  void addRange(double count, const SobolSums& other, std::size_t begin, std::size_t end) {
+    for (std::size_t i = begin; i < end; ++i) numbers_[i] += count * other.numbers_[i];
   }
   double meanAt(std::size_t at) const { return numbers_[at] / numbers_[at + 1]; }
 
@@ -118,6 +126,35 @@ struct Extent {
   bool isConstant() const { return largest - least <= 1e-12 * std::max(std::abs(least), std::abs(largest)); }
 };
 
+constexpr std::size_t kMostDominating = 3;
+constexpr double kNearlyAll = 0.9;
+constexpr std::size_t kRowsPerDominating = 10;  // of fewer rows three may well be most of the variance
+
+/// Notes the blocks that make nearly all of the squared deviations from the mean.
+void findDominating(const SobolDesign& design, std::span<const double> values, SobolIndices& found) {
+  double farthest = 0.0;
+  for (std::size_t set = 0; set < design.setCount(); ++set) {
+    const double deviation = std::abs(values[set] - found.mean);
+    if (!(deviation > farthest)) continue;
+    farthest = deviation;
+    found.farthestSet = set;
+  }
+  const std::size_t most = std::min(kMostDominating, design.rows / kRowsPerDominating);
+  std::vector<double> squares(design.rows, 0.0);  // in those of the farthest value, which are finite
+  for (std::size_t set = 0; set < design.setCount(); ++set) {
+    if (!std::isnan(values[set])) squares[set / design.setsPerRow()] += square((values[set] - found.mean) / farthest);
+  }
+  const double all = std::accumulate(squares.begin(), squares.end(), 0.0);
+  std::ranges::partial_sort(squares, squares.begin() + static_cast<std::ptrdiff_t>(most), std::ranges::greater{});
+  double part = 0.0;
+  for (std::size_t i = 0; i < most; ++i) {
+    part += squares[i];
+    if (!(part > kNearlyAll * all)) continue;
+    found.dominatingBlocks = i + 1;
+    return;
+  }
+}
+
 /// The indices that follow from sums, in the order: first, total and interactions of the factors, the pairs, the sums
 /// of first and total.
 void indicesOf(const SobolSums& sums, const SobolDesign& design,
@@ -185,11 +222,11 @@ std::vector<SobolSums> sumsOfReplicates(const SobolDesign& design, std::span<con
   return sums;
 }
 
-/// Fills in the limits of all indices.
+/// Fills in the limits of all indices, of as many at a time as `mostDrawn` of bootstrap samples are.
 void takeLimits(const SobolDesign& design, std::span<const SobolSums> replicates,
                 std::span<const std::pair<std::size_t, std::size_t>> pairs, const ReplicateBootstrap& bootstrap,
-                std::size_t samples, std::vector<SobolIndex>& indices) {
-  std::vector<std::vector<double>> drawn(indices.size());
+                std::size_t samples, std::size_t mostDrawn, std::vector<SobolIndex>& indices) {
+  const std::size_t k = design.factors;
   SobolSums sums = replicates.front();
   std::vector<double> ofSample;
   // Of how many replicates each index has terms: after failed runs not of all.
@@ -198,23 +235,30 @@ void takeLimits(const SobolDesign& design, std::span<const SobolSums> replicates
     indicesOf(replicate, design, pairs, ofSample);
     for (std::size_t i = 0; i < used.size(); ++i) used[i] += std::isnan(ofSample[i]) ? 0 : 1;
   }
-  for (std::size_t sample = 0; sample < samples; ++sample) {
-    sums.clear();
-    for (std::size_t r = 0; r < replicates.size(); ++r) {
-      const double count = bootstrap.counts(sample)[r];
-      if (count > 0.0) sums.addTimes(count, replicates[r]);
+  const std::size_t atOnce = std::max<std::size_t>(1, mostDrawn / std::max<std::size_t>(samples, 1));
+  for (std::size_t begin = 0; begin < indices.size(); begin += atOnce) {
+    const std::size_t end = std::min(begin + atOnce, indices.size());
+    const auto pairAt = [&](std::size_t i) { return std::clamp(i, 3 * k, 3 * k + pairs.size()) - 3 * k; };
+    std::vector<std::vector<double>> drawn(end - begin);
+    for (std::size_t sample = 0; sample < samples; ++sample) {
+      sums.clear();
+      for (std::size_t r = 0; r < replicates.size(); ++r) {
+        const double count = bootstrap.counts(sample)[r];
+        if (count > 0.0) sums.addTimes(count, replicates[r], pairAt(begin), pairAt(end));
+      }
+      indicesOf(sums, design, pairs, ofSample);
+      for (std::size_t i = begin; i < end; ++i) {
+        if (std::isfinite(ofSample[i])) drawn[i - begin].push_back(ofSample[i]);
+      }
     }
-    indicesOf(sums, design, pairs, ofSample);
-    for (std::size_t i = 0; i < drawn.size(); ++i) {
-      if (std::isfinite(ofSample[i])) drawn[i].push_back(ofSample[i]);
+    for (std::size_t i = begin; i < end; ++i) {
+      std::vector<double>& values = drawn[i - begin];
+      if (std::isnan(indices[i].value) || used[i] < 2 || values.empty()) continue;
+      std::ranges::sort(values);
+      const double probability = expandedProbability(used[i]);
+      indices[i].lower = std::min(indices[i].value, sortedQuantile(values, probability));
+      indices[i].upper = std::max(indices[i].value, sortedQuantile(values, 1.0 - probability));
     }
-  }
-  for (std::size_t i = 0; i < drawn.size(); ++i) {
-    if (std::isnan(indices[i].value) || used[i] < 2 || drawn[i].empty()) continue;
-    std::ranges::sort(drawn[i]);
-    const double probability = expandedProbability(used[i]);
-    indices[i].lower = std::min(indices[i].value, sortedQuantile(drawn[i], probability));
-    indices[i].upper = std::max(indices[i].value, sortedQuantile(drawn[i], 1.0 - probability));
   }
 }
 
@@ -230,7 +274,8 @@ ReplicateBootstrap::ReplicateBootstrap(std::size_t samples, UniformGenerator& ra
 }
 
 SobolIndices sobolIndices(const SobolDesign& design, std::span<const double> values,
-                          const ReplicateBootstrap& bootstrap, std::size_t bootstrapSamples, bool withPairs) {
+                          const ReplicateBootstrap& bootstrap, std::size_t bootstrapSamples, bool withPairs,
+                          std::size_t mostDrawn) {
   const std::size_t k = design.factors;
   Extent extent;
   for (std::size_t row = 0; row < design.rows; ++row) {
@@ -255,8 +300,9 @@ SobolIndices sobolIndices(const SobolDesign& design, std::span<const double> val
       all[i].blocks = blocks[i];
       if (!found.isConstant && std::isfinite(estimates[i])) all[i].value = estimates[i];
     }
-    if (!found.isConstant) {
-      takeLimits(design, replicates, pairs, bootstrap, std::min(bootstrapSamples, bootstrap.size()), all);
+    if (!found.isConstant) findDominating(design, values, found);
+    if (!found.isConstant && found.dominatingBlocks == 0) {
+      takeLimits(design, replicates, pairs, bootstrap, std::min(bootstrapSamples, bootstrap.size()), mostDrawn, all);
     }
   }
   const auto part = [&all](std::size_t from, std::size_t count) {

@@ -25,7 +25,12 @@ struct SobolIndices {
   std::size_t valueCount = 0;  ///< successful runs of A and B, of which mean and variance are
   double mean = std::numeric_limits<double>::quiet_NaN();
   double variance = std::numeric_limits<double>::quiet_NaN();
-  bool isConstant = false;               ///< no index: all values are equal
+  bool isConstant = false;  ///< no index: all values are equal
+  /// Blocks, at most three, that make nearly all of the variance of all runs; 0 where it takes more. Other points would
+  /// then give other indices, and the indices have no limits: those of a bootstrap say how much the blocks at hand
+  /// differ, and nothing of the next one of this kind.
+  std::size_t dominatingBlocks = 0;
+  std::size_t farthestSet = 0;           ///< of the design: its value is the farthest from the mean
   std::vector<SobolIndex> first;         ///< one per factor: of the factor by itself
   std::vector<SobolIndex> total;         ///< with all of its interactions
   std::vector<SobolIndex> interactions;  ///< total less first
@@ -58,8 +63,9 @@ class ReplicateBootstrap final {
 ///
 /// Limits: quantiles of a bootstrap over the replicates, which are independent while the rows of one are not, taken as
 /// far outside as Student's t demands for so few (Hesterberg 2015, doi:10.1080/00031305.2015.1089789). Uses the first
-/// `bootstrapSamples` of `bootstrap`.
+/// `bootstrapSamples` of `bootstrap`, of whose indices about `mostDrawn` are in memory at a time.
 SobolIndices sobolIndices(const SobolDesign& design, std::span<const double> values,
-                          const ReplicateBootstrap& bootstrap, std::size_t bootstrapSamples, bool withPairs = true);
+                          const ReplicateBootstrap& bootstrap, std::size_t bootstrapSamples, bool withPairs = true,
+                          std::size_t mostDrawn = 16'000'000);
 
 }  // namespace mirevo

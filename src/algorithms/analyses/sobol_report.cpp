@@ -18,9 +18,11 @@ constexpr std::size_t kMostShownFactors = 20;
 constexpr std::size_t kMostNames = 10;
 /// Limits farther than this from an index leave open which factor matters more.
 constexpr double kWideHalfWidth = 0.1;
+constexpr double kMostFurther = 100.0;  // times the blocks: more are not worth naming
+constexpr double kTail = 0.05;
 
 std::string share(double value) {
-  return fmt::format("{:.3f}", value == 0.0 ? 0.0 : value);
+  return std::abs(value) < 1000.0 ? fmt::format("{:.3f}", value == 0.0 ? 0.0 : value) : fmt::format("{:.3g}", value);
 }
 
 std::string limitsText(const SobolIndex& index) {
@@ -41,7 +43,10 @@ std::string namesWithLimits(std::span<const std::string> names, std::span<const 
                             std::span<const std::size_t> chosen) {
   std::string text;
   for (std::size_t i = 0; i < std::min(chosen.size(), kMostNames); ++i) {
-    text += fmt::format("{}{} ({})", i == 0 ? "" : ", ", names[chosen[i]], limitsText(indices[chosen[i]]));
+    const SobolIndex& index = indices[chosen[i]];
+    const bool isInert = index.value == 0.0 && index.lower == 0.0 && index.upper == 0.0;
+    text += fmt::format("{}{} ({})", i == 0 ? "" : ", ", names[chosen[i]],
+                        isInert ? "no effect in any block" : limitsText(index));
   }
   if (chosen.size() > kMostNames) text += fmt::format(" and {} more", chosen.size() - kMostNames);
   return text;
@@ -73,6 +78,14 @@ std::string whyNoIndices(const SobolIndices& indices) {
   if (hasVariance(indices)) return "";
   return "no indices, the variance of its values is not a finite number: they are as large as 1e150, or as small as "
          "1e-150";
+}
+
+/// "2 of the 64 blocks make more than 90 % of the variance, and other points may give other indices"
+std::string dominanceText(const SobolFindings& findings, const SobolIndices& indices) {
+  const std::size_t count = indices.dominatingBlocks;
+  return fmt::format(
+      "{} of the {} blocks make{} more than 90 % of the variance, and other points may give other indices", count,
+      findings.design.rows, count == 1 ? "s" : "");
 }
 
 bool isShown(const SobolFindings& findings, const SobolOutput& output) {
@@ -122,12 +135,21 @@ void appendFixable(const SobolFindings& findings, const SobolOutput& output, std
         fmt::format("   No parameter can be fixed: none has a total index that is below {:g} for certain", limit));
   } else {
     double most = 0.0;
-    for (const std::size_t j : fixable) most += indices.total[j].upper;
+    std::size_t fewest = std::numeric_limits<std::size_t>::max();
+    for (const std::size_t j : fixable) {
+      most += indices.total[j].upper;
+      fewest = std::min(fewest, indices.total[j].blocks);
+    }
     lines.push_back(fmt::format("   Can be fixed, as the upper limit of the total index is below {:g}: {}", limit,
                                 namesWithLimits(names, indices.total, fixable)));
     if (fixable.size() > 1) {
-      lines.push_back(fmt::format("   All of these fixed together cost at most {} of the variance", share(most)));
+      lines.push_back(
+          fmt::format("   All of these fixed together cost about {} of the variance at most, the sum of these limits",
+                      share(most)));
     }
+    lines.push_back(
+        fmt::format("   What acts in less than {:.2g} % of the space may have gone unseen in {} blocks (95 %)",
+                    100.0 * (1.0 - std::pow(kTail, 1.0 / static_cast<double>(fewest))), fewest));
   }
   const auto open = factorsWhere(
       indices, [&](std::size_t j) { return !(indices.total[j].upper < limit) && !(indices.total[j].lower >= limit); });
@@ -288,6 +310,11 @@ std::vector<std::string> formatSobol(const SobolFindings& findings, std::string_
     lines.push_back(fmt::format("{} {}: mean {:.6g}, standard deviation {:.6g}; indices with limits of 95 %",
                                 kindText(output), output.name, indices.mean, std::sqrt(indices.variance)));
     appendTable(findings, output, lines);
+    if (indices.dominatingBlocks > 0) {
+      lines.push_back(fmt::format("   Which parameters can be fixed is not said, and there are no limits: {}",
+                                  dominanceText(findings, indices)));
+      continue;
+    }
     appendFixable(findings, output, lines);
     appendInteractions(findings, output, lines);
     appendNegative(findings, output, lines);
@@ -306,6 +333,13 @@ std::vector<std::string> sobolWarnings(const SobolFindings& findings) {
     warnings.push_back(fmt::format("{} {}: {}. A run that yields such values should fail, or have bounds that avoid it",
                                    kindText(output), output.name, whyNoIndices(indices)));
   }
+  for (const SobolOutput& output : findings.outputs) {
+    if (!isShown(findings, output) || output.indices.dominatingBlocks == 0) continue;
+    warnings.push_back(fmt::format(
+        "{} {}: {}. The farthest value is that of evaluation No. {}: see whether it is what the model should yield; if "
+        "so, take more blocks, or an output that grows less, such as a logarithm",
+        kindText(output), output.name, dominanceText(findings, output.indices), output.indices.farthestSet + 1));
+  }
   double most = 0.0;
   std::string name;
   for (const SobolOutput& output : findings.outputs) {
@@ -316,11 +350,19 @@ std::vector<std::string> sobolWarnings(const SobolFindings& findings) {
   }
   if (most > kWideHalfWidth) {
     // The limits narrow with the root of the sample at least.
-    const double wanted = static_cast<double>(findings.design.rows) * std::pow(most / kWideHalfWidth, 2);
+    const double factor = std::pow(most / kWideHalfWidth, 2);
+    const std::string remedy =
+        factor <= kMostFurther
+            ? fmt::format("Sample_Size = {} would bring them to about {:g}",
+                          std::bit_ceil(static_cast<std::uint64_t>(
+                              std::ceil(static_cast<double>(findings.design.rows) * factor))),
+                          kWideHalfWidth)
+            : fmt::format("No Sample_Size worth running would bring them to {:g}: a few runs make most of the variance",
+                          kWideHalfWidth);
     warnings.push_back(fmt::format(
         "The design is too small to tell which parameter matters more: limits of the indices of {} are {} away from "
-        "them. Sample_Size = {} would bring them to about {:g}",
-        name, share(most), std::bit_ceil(static_cast<std::uint64_t>(std::ceil(wanted))), kWideHalfWidth));
+        "them. {}",
+        name, share(most), remedy));
   }
   const double failed =
       static_cast<double>(findings.failedCount) / static_cast<double>(std::max<std::size_t>(findings.runCount, 1));

@@ -14,4 +14,9 @@ void logReport(const TaskContext& context, std::span<const std::string> report) 
   for (const std::string& line : report) context.log.reportLine(line);
 }
 
+void addNotes(std::span<const std::string> warnings, std::vector<std::string>& report) {
+  if (!warnings.empty()) report.emplace_back();
+  for (const std::string& text : warnings) report.push_back("Note: " + text);
+}
+
 }  // namespace mirevo

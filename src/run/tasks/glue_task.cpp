@@ -52,11 +52,6 @@ UnitPoints pointsOf(GlueSampling sampling, std::size_t count, std::size_t dimens
 }
 
 /// The log has warnings as such; the result file has them, too.
-void addNotes(std::span<const std::string> warnings, std::vector<std::string>& report) {
-  if (!warnings.empty()) report.emplace_back();
-  for (const std::string& text : warnings) report.push_back("Note: " + text);
-}
-
 std::string samplingName(GlueSampling sampling) {
   return std::string(kGlueSamplingNames[static_cast<std::size_t>(sampling)].name);
 }

@@ -282,13 +282,16 @@ TaskOutcome SobolTask::run(const TaskContext& context) {
   std::vector<std::string> warnings;
   TaskOutcome outcome = outcomeOf(context, results, warnings);
   logReport(context, outcome.report);
+  addNotes(warnings, outcome.report);
   for (const std::string& warning : warnings) context.log.warning(warning);
   return outcome;
 }
 
 std::optional<TaskOutcome> SobolTask::unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const {
   std::vector<std::string> warnings;
-  return outcomeOf(context, made.results, warnings);
+  TaskOutcome outcome = outcomeOf(context, made.results, warnings);
+  addNotes(warnings, outcome.report);
+  return outcome;
 }
 
 }  // namespace mirevo

@@ -1,8 +1,11 @@
 #include "algorithms/analyses/sobol_indices.h"
 
+#include <algorithm>
 #include <cmath>
 #include <limits>
+#include <utility>
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -211,6 +214,80 @@ TEST(SobolReport, SaysWhatCanBeFixedAndWhatInteracts) {
   EXPECT_THAT(sobolWarnings(findings), ::testing::Contains(::testing::HasSubstr("10 % of the model runs failed")));
 }
 
+struct SobolTexts {
+  std::string log;
+  std::string warnings;
+};
+
+SobolTexts textsOf(const SobolDesignRun& run) {
+  SobolFindings findings;
+  findings.design = run.design;
+  findings.factors = run.problem.factors;
+  for (const SobolFactor& factor : findings.factors) findings.parameters.push_back(factor.name);
+  findings.outputs.push_back(sobolOutput(run.design, run.values, run.bootstrap, "objective", "fit"));
+  findings.runCount = run.values.size();
+  SobolTexts texts;
+  for (const std::string& line : formatSobol(findings, "basin_Sobol.dat")) texts.log += line + "\n";
+  for (const std::string& warning : sobolWarnings(findings)) texts.warnings += warning + "\n";
+  return texts;
+}
+
+/// x1 + x2 / 2, and `height` more where x3 is above `from`: x3 is that of a corner.
+SobolFunction corner(double from, double height) {
+  const auto value = [=](std::span<const double> x) { return x[0] + 0.5 * x[1] + (x[2] > from ? height : 0.0); };
+  return {"corner", value, {0.0, 0.0, 0.0}, {0.0, 0.0, 0.0}};
+}
+
+TEST(SobolReport, IsNotSureOfWhatNoPointHasMet) {
+  const SobolTexts texts = textsOf(SobolDesignRun(corner(0.9999, 300.0), 64));
+  EXPECT_THAT(texts.log, ::testing::HasSubstr("Can be fixed, as the upper limit of the total index is below 0.05: x3 "
+                                              "(no effect in any block)\n   What acts in less than 4.6 % of the space "
+                                              "may have gone unseen in 64 blocks (95 %)"));
+  EXPECT_THAT(texts.log, ::testing::Not(::testing::HasSubstr("nan")));
+}
+
+// The limits of a bootstrap know nothing of the next point in the corner.
+TEST(SobolReport, SaysNothingOfIndicesThatAreThoseOfAFewRuns) {
+  SobolDesignRun run(corner(0.9999, 0.0), 64);
+  const SobolIndices whole = run.indices();
+  EXPECT_EQ(whole.dominatingBlocks, 0U);
+  EXPECT_FALSE(std::isnan(whole.total[0].upper));
+  run.values[run.design.ofAWithB(7, 1)] = 1.0e12;
+  const SobolIndices found = run.indices();
+  EXPECT_EQ(found.dominatingBlocks, 1U);
+  EXPECT_EQ(found.farthestSet, run.design.ofAWithB(7, 1));
+  EXPECT_TRUE(std::isnan(found.total[0].upper));
+  const SobolTexts texts = textsOf(run);
+  EXPECT_THAT(texts.log,
+              ::testing::HasSubstr("Which parameters can be fixed is not said, and there are no limits: 1 of "
+                                   "the 64 blocks makes more than 90 % of the variance"));
+  EXPECT_THAT(texts.log, ::testing::Not(::testing::HasSubstr("Can be fixed, ")));
+  EXPECT_THAT(texts.warnings, ::testing::HasSubstr(fmt::format("The farthest value is that of evaluation No. {}",
+                                                               run.design.ofAWithB(7, 1) + 1)));
+  EXPECT_THAT(texts.warnings, ::testing::Not(::testing::HasSubstr("Sample_Size")));
+  // Four blocks are a sample, if a small one.
+  for (const std::size_t row : {12U, 23U, 34U}) run.values[run.design.ofA(row)] = -1.0e12;
+  EXPECT_EQ(run.indices().dominatingBlocks, 0U);
+}
+
+TEST(SobolIndices, HaveTheSameLimitsWhereTheirBootstrapSamplesDoNotFitIntoMemoryAtOnce) {
+  const SobolDesignRun run(gFunctionOfEight(), 32, true);
+  const SobolIndices whole = run.indices();
+  for (const std::size_t atOnce : {1U, 7U, 20U, 53U}) {
+    const SobolIndices found =
+        sobolIndices(run.design, run.values, run.bootstrap, run.bootstrap.size(), true, atOnce * run.bootstrap.size());
+    for (const auto part :
+         {&SobolIndices::first, &SobolIndices::total, &SobolIndices::interactions, &SobolIndices::second}) {
+      for (std::size_t i = 0; i < (whole.*part).size(); ++i) {
+        EXPECT_EQ((found.*part)[i].lower, (whole.*part)[i].lower) << atOnce << " " << i;
+        EXPECT_EQ((found.*part)[i].upper, (whole.*part)[i].upper) << atOnce << " " << i;
+      }
+    }
+    EXPECT_EQ(found.sumOfFirst.lower, whole.sumOfFirst.lower);
+    EXPECT_EQ(found.sumOfTotal.upper, whole.sumOfTotal.upper);
+  }
+}
+
 TEST(SobolReport, WarnsOfADesignThatIsTooSmall) {
   const SobolDesignRun run(ishigami(), 32);
   SobolFindings findings;
@@ -220,6 +297,16 @@ TEST(SobolReport, WarnsOfADesignThatIsTooSmall) {
   findings.runCount = run.values.size();
   EXPECT_THAT(sobolWarnings(findings), ::testing::ElementsAre(::testing::ContainsRegex(
                                            "too small to tell .* of fit are 0\\.[0-9]+ away.*Sample_Size = ")));
+  const std::pair<double, const char*> widths[] = {
+      {0.9, "Sample_Size = 4096 would bring them to about 0.1"},
+      {30.0, "No Sample_Size worth running would bring them to 0.1: a few runs make most of the variance"},
+      {1.0e23, "are 1e+23 away from them. No Sample_Size worth running"}};
+  for (const auto& [width, expected] : widths) {
+    SobolIndex& index = findings.outputs.front().indices.total.front();
+    index.lower = 0.0;
+    index.upper = 2.0 * width;
+    EXPECT_THAT(sobolWarnings(findings), ::testing::ElementsAre(::testing::HasSubstr(expected)));
+  }
 }
 
 TEST(SobolReport, HasNoIndicesOfValuesWithoutAFiniteVarianceAndNoInteractionsOfOneParameter) {
