@@ -1,4 +1,5 @@
-/// Prints the tables of docs/algorithms/morris.md. Usage: morris_limits coverage | cost [parameters trajectories].
+/// Prints the tables of docs/algorithms/morris.md. Usage: morris_limits coverage | cost [parameters trajectories
+/// [uniform|beta|correlated]].
 /// Repetitions have the seeds 1, 2, 3, ..., so that the figures, but for seconds and memory, are the same every time.
 
 #include <array>
@@ -178,9 +179,20 @@ void printCoverage() {
   }
 }
 
-void printCost(std::size_t size, std::int32_t trajectories) {
+/// Of `size` parameters: uniform, beta, and uniform with the first two correlated.
+ParameterDistributions distributionsOf(std::string_view kind, std::size_t size) {
+  const auto one = kind == "beta" ? betaDistribution(2.5, 1.3, 0.0, 1.0) : uniformDistribution(0.0, 1.0);
+  const std::vector<DistributionPointer> all(size, one);
+  if (kind != "correlated") return ParameterDistributions(all);
+  std::vector<std::vector<double>> correlations(size, std::vector<double>(size, 0.0));
+  for (std::size_t i = 0; i < size; ++i) correlations[i][i] = 1.0;
+  correlations[0][1] = correlations[1][0] = 0.5;
+  return ParameterDistributions(all, GaussianCopula(std::move(correlations), std::vector<std::string>(size)));
+}
+
+void printCost(std::size_t size, std::int32_t trajectories, std::string_view kind) {
   const SearchSpace space = unitSpace(size);
-  const auto distributions = ParameterDistributions::uniform(space);
+  const ParameterDistributions distributions = distributionsOf(kind, size);
   using Clock = std::chrono::steady_clock;
   const auto secondsSince = [](Clock::time_point start) {
     return std::chrono::duration<double>(Clock::now() - start).count();
@@ -209,10 +221,10 @@ void printCost(std::size_t size, std::int32_t trajectories) {
     rusage use{};
     getrusage(RUSAGE_SELF, &use);
     fmt::print(
-        "{} parameters, {} {} trajectories, {} sets: {:.2f} s planning, {:.2f} s for the sets and the function, "
+        "{} parameters, {}, {} {} trajectories, {} sets: {:.2f} s planning, {:.2f} s for the sets and the function, "
         "{:.2f} s for statistics and texts of one output; {} MB at most so far\n",
-        size, trajectories, kEffectDesignNames[static_cast<int>(design)].name, plan.evaluationCount, planning, sets,
-        secondsSince(start), use.ru_maxrss / 1024);
+        size, kind, trajectories, kEffectDesignNames[static_cast<int>(design)].name, plan.evaluationCount, planning,
+        sets, secondsSince(start), use.ru_maxrss / 1024);
   }
 }
 
@@ -225,9 +237,9 @@ int main(int argc, char** argv) {
     mirevo::printCoverage();
   } else if (table == "cost") {
     mirevo::printCost(argc > 2 ? static_cast<std::size_t>(std::atoi(argv[2])) : 1000,
-                      argc > 3 ? std::atoi(argv[3]) : 30);
+                      argc > 3 ? std::atoi(argv[3]) : 30, argc > 4 ? argv[4] : "uniform");
   } else {
-    fmt::print(stderr, "usage: morris_limits coverage | cost [parameters trajectories]\n");
+    fmt::print(stderr, "usage: morris_limits coverage | cost [parameters trajectories [uniform|beta|correlated]]\n");
     return 2;
   }
   return 0;

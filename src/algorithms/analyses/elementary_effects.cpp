@@ -40,7 +40,7 @@ class Planner {
     plan_.design = settings.design;
     plan_.unchanged.assign(size(), 0);
     plan_.infeasible.assign(size(), 0);
-    plan_.isCorrelated = isCorrelated();
+    plan_.isCorrelated = distributions_.copula() && !distributions_.copula()->correlatedOnes().empty();
   }
 
   EffectPlan make() {
@@ -63,18 +63,23 @@ class Planner {
 
   std::size_t size() const { return distributions_.size(); }
   double valueAt(std::size_t j, std::span<const double> point) const {
-    return toModelScale(space_, j, distributions_.setAt(point)[j]);
+    return toModelScale(space_, j, distributions_.valueAt(j, point));
   }
-  bool isCorrelated() const;
-  /// Whether the set at a point can be run; if not, that is noted when `isNoted`.
-  bool canRun(std::span<const double> point, bool isNoted);
-  double position(std::size_t j, std::span<const double> point);
-  double middleOfValue(std::size_t j, std::vector<double> point);
+  bool isCorrelated(std::size_t j) const { return distributions_.copula() && distributions_.copula()->isCorrelated(j); }
+  /// Whether a set can be run; if not, that is noted when `isNoted`.
+  bool canRun(std::span<const double> set, bool isNoted);
+  /// Before and after these, which move in coordinate j meanwhile, the point is the same.
+  double position(std::size_t j, std::vector<double>& point);
+  double middleOfValue(std::size_t j, std::vector<double>& point);
   double widthOf(std::size_t j, std::vector<double>& point, double target);
 
   void planRadial();
   bool takeBase(std::vector<double>& base);
-  void stepFromBase(EffectTrajectory& trajectory, std::size_t j, double target);
+  void stepFromBase(EffectTrajectory& trajectory, const ParameterSet& base, std::size_t j, double target);
+  /// Empty where it is not tested whether sets can be run.
+  ParameterSet testedSetAt(std::span<const double> point) const {
+    return feasibility_.isTested() ? distributions_.setAt(point) : ParameterSet();
+  }
   void planChains();
   std::vector<Chain> drawChains();
   static double spreadOf(std::span<const Chain> chains, double enough);
@@ -90,24 +95,16 @@ class Planner {
   std::map<std::pair<std::size_t, double>, double> middles_;  ///< by integer parameter and value
 };
 
-bool Planner::isCorrelated() const {
-  const auto& copula = distributions_.copula();
-  for (std::size_t j = 0; copula && j < size(); ++j) {
-    if (copula->isCorrelated(j)) return true;
-  }
-  return false;
-}
-
-bool Planner::canRun(std::span<const double> point, bool isNoted) {
+bool Planner::canRun(std::span<const double> set, bool isNoted) {
   if (!feasibility_.isTested()) return true;
-  auto violation = feasibility_.violation(distributions_.setAt(point));
+  auto violation = feasibility_.violation(set);
   if (!violation) return true;
   if (isNoted && plan_.infeasiblePoints++ == 0) plan_.violation = *std::move(violation);
   return false;
 }
 
 /// The middle of the coordinates at which an integer parameter has the value that it has at the point.
-double Planner::middleOfValue(std::size_t j, std::vector<double> point) {
+double Planner::middleOfValue(std::size_t j, std::vector<double>& point) {
   constexpr int kHalvings = 40;
   const double value = valueAt(j, point);
   const auto known = middles_.find({j, value});
@@ -125,20 +122,22 @@ double Planner::middleOfValue(std::size_t j, std::vector<double> point) {
   };
   const double below = edge(kEdge);
   const double middle = 0.5 * (below + edge(1.0 - kEdge));
-  if (!plan_.isCorrelated) middles_[{j, value}] = middle;
+  point[j] = inside;
+  if (!isCorrelated(j)) middles_[{j, value}] = middle;
   return middle;
 }
 
 /// Where the parameter is in its distribution: 0 at the beginning, 1 at the end. Of an integer parameter the first
 /// value is at 0 and the last one at 1; uniform between its bounds, it has the others evenly between.
-double Planner::position(std::size_t j, std::span<const double> point) {
-  if (space_.transformation[j] != TransformationType::integer) return point[j];
-  std::vector<double> moved(point.begin(), point.end());
-  const double middle = middleOfValue(j, moved);
-  moved[j] = kEdge;
-  const double first = middleOfValue(j, moved);
-  moved[j] = 1.0 - kEdge;
-  const double last = middleOfValue(j, moved);
+double Planner::position(std::size_t j, std::vector<double>& point) {
+  const double from = point[j];
+  if (space_.transformation[j] != TransformationType::integer) return from;
+  const double middle = middleOfValue(j, point);
+  point[j] = kEdge;
+  const double first = middleOfValue(j, point);
+  point[j] = 1.0 - kEdge;
+  const double last = middleOfValue(j, point);
+  point[j] = from;
   return last > first ? (middle - first) / (last - first) : 0.0;
 }
 
@@ -156,15 +155,15 @@ double Planner::widthOf(std::size_t j, std::vector<double>& point, double target
 
 /// Another point in place of one that cannot be run, if one is found.
 bool Planner::takeBase(std::vector<double>& base) {
-  if (canRun(base, false)) return true;
+  if (canRun(testedSetAt(base), false)) return true;
   for (int i = 0; i < kMostBaseTries; ++i) {
     for (double& u : base) u = random_.next();
-    if (canRun(base, false)) return true;
+    if (canRun(testedSetAt(base), false)) return true;
   }
-  return canRun(base, true);
+  return canRun(testedSetAt(base), true);
 }
 
-void Planner::stepFromBase(EffectTrajectory& trajectory, std::size_t j, double target) {
+void Planner::stepFromBase(EffectTrajectory& trajectory, const ParameterSet& base, std::size_t j, double target) {
   bool wasChanged = false;
   for (int i = 0; i < kMostTries; ++i) {
     double u = target + i * kGoldenRatio;
@@ -175,10 +174,13 @@ void Planner::stepFromBase(EffectTrajectory& trajectory, std::size_t j, double t
     const double width = widthOf(j, trajectory.base, trajectory.moved[j]);
     if (width == 0.0) continue;
     wasChanged = true;
-    const double from = std::exchange(trajectory.base[j], trajectory.moved[j]);
-    const bool isPossible = canRun(trajectory.base, false);
-    trajectory.base[j] = from;
-    if (!isPossible) continue;
+    if (feasibility_.isTested()) {
+      ParameterSet set = base;
+      const double from = std::exchange(trajectory.base[j], trajectory.moved[j]);
+      distributions_.move(set, j, trajectory.base);
+      trajectory.base[j] = from;
+      if (!canRun(set, false)) continue;
+    }
     trajectory.width[j] = width;
     trajectory.evaluations[j + 1] = ++plan_.evaluationCount;
     return;
@@ -207,7 +209,8 @@ void Planner::planRadial() {
     trajectory.evaluations.assign(p + 1, 0);
     if (!takeBase(trajectory.base)) continue;
     trajectory.evaluations[0] = ++plan_.evaluationCount;
-    for (std::size_t j = 0; j < p; ++j) stepFromBase(trajectory, j, point[p + j]);
+    const ParameterSet base = testedSetAt(trajectory.base);
+    for (std::size_t j = 0; j < p; ++j) stepFromBase(trajectory, base, j, point[p + j]);
   }
 }
 
@@ -275,7 +278,8 @@ void Planner::follow(const Chain& chain) {
   trajectory.width.assign(p, 0.0);
   trajectory.evaluations.assign(p + 1, 0);
   std::vector<double> point = trajectory.base;
-  if (canRun(point, true)) trajectory.evaluations[0] = ++plan_.evaluationCount;
+  ParameterSet set = testedSetAt(point);
+  if (canRun(set, true)) trajectory.evaluations[0] = ++plan_.evaluationCount;
   for (std::size_t k = 0; k < p; ++k) {
     const std::size_t j = trajectory.order[k];
     trajectory.width[j] = widthOf(j, point, trajectory.moved[j]);
@@ -289,7 +293,8 @@ void Planner::follow(const Chain& chain) {
       continue;
     }
     point[j] = trajectory.moved[j];
-    if (canRun(point, true)) trajectory.evaluations[k + 1] = ++plan_.evaluationCount;
+    if (feasibility_.isTested()) distributions_.move(set, j, point);
+    if (canRun(set, true)) trajectory.evaluations[k + 1] = ++plan_.evaluationCount;
   }
   std::vector<bool> hasEffect(p);
   for (const EffectPair& pair : pairsOf(plan_, trajectory)) hasEffect[pair.parameter] = true;
@@ -322,13 +327,18 @@ std::vector<ParameterSet> setsOf(const EffectPlan& plan, const EffectTrajectory&
                                  const ParameterDistributions& distributions) {
   std::vector<ParameterSet> sets;
   std::vector<double> point = trajectory.base;
-  if (trajectory.evaluations[0] > 0) sets.push_back(distributions.setAt(point));
+  ParameterSet set = distributions.setAt(point);
+  const ParameterSet base = set;
+  if (trajectory.evaluations[0] > 0) sets.push_back(set);
   for (std::size_t k = 0; k < trajectory.order.size(); ++k) {
     const std::size_t j = trajectory.order[k];
     if (trajectory.width[j] == 0.0) continue;
     const double from = std::exchange(point[j], trajectory.moved[j]);
-    if (trajectory.evaluations[k + 1] > 0) sets.push_back(distributions.setAt(point));
-    if (plan.design == EffectDesign::radial) point[j] = from;
+    distributions.move(set, j, point);
+    if (trajectory.evaluations[k + 1] > 0) sets.push_back(set);
+    if (plan.design == EffectDesign::trajectories) continue;
+    point[j] = from;
+    set = base;
   }
   return sets;
 }

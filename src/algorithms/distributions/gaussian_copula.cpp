@@ -66,26 +66,38 @@ GaussianCopula::GaussianCopula(std::vector<std::vector<double>> correlations, st
     for (std::size_t j = 0; j <= i; ++j) factor_.push_back(factor[j * n + i]);
     logOfRoot_ += std::log(factor_.back());
     for (std::size_t j = 0; j < n; ++j) isCorrelated_[i] = isCorrelated_[i] || (j != i && correlations_[i][j] != 0.0);
+    if (isCorrelated_[i]) correlatedOnes_.push_back(i);
   }
 }
 
 std::vector<double> GaussianCopula::correlated(std::span<const double> independent) const {
-  std::vector<double> scores(size());
-  std::size_t at = 0;
-  for (std::size_t i = 0; i < size(); ++i) {
-    for (std::size_t j = 0; j <= i; ++j) scores[i] += factor_[at++] * independent[j];
-  }
+  std::vector<double> scores(independent.begin(), independent.end());
+  for (const std::size_t i : correlatedOnes_) scores[i] = correlatedAt(i, independent);
   return scores;
+}
+
+double GaussianCopula::correlatedAt(std::size_t i, std::span<const double> independent) const {
+  if (!isCorrelated_[i]) return independent[i];
+  const double* row = &factor_[i * (i + 1) / 2];
+  double score = 0.0;
+  for (const std::size_t j : correlatedOnes_) {
+    if (j > i) break;
+    score += row[j] * independent[j];
+  }
+  return score;
 }
 
 double GaussianCopula::logDensity(std::span<const double> scores) const {
   std::vector<double> independent(size());  // L^-1 z
   double difference = 0.0;                  // z'(R^-1 - I)z
-  std::size_t at = 0;
-  for (std::size_t i = 0; i < size(); ++i) {
+  for (const std::size_t i : correlatedOnes_) {
+    const double* row = &factor_[i * (i + 1) / 2];
     double rest = scores[i];
-    for (std::size_t j = 0; j < i; ++j) rest -= factor_[at++] * independent[j];
-    independent[i] = rest / factor_[at++];
+    for (const std::size_t j : correlatedOnes_) {
+      if (j >= i) break;
+      rest -= row[j] * independent[j];
+    }
+    independent[i] = rest / row[i];
     difference += independent[i] * independent[i] - scores[i] * scores[i];
   }
   return -0.5 * difference - logOfRoot_;

@@ -24,18 +24,39 @@ ParameterSet ParameterDistributions::setAt(std::span<const double> point) const 
   assert(point.size() == size());
   ParameterSet set(size());
   std::vector<double> scores;
-  if (copula_) {
-    for (const double p : point) {
-      int fault = 0;
-      scores.push_back(normalQuantile(p, fault));
-    }
-    scores = copula_->correlated(scores);
-  }
+  if (copula_) scores = copula_->correlated(scoresOf(point, size()));
   for (std::size_t j = 0; j < set.size(); ++j) {
     const bool isCorrelated = copula_ && copula_->isCorrelated(j);
     set[j] = isCorrelated ? ofParameters_[j]->atScore(scores[j]) : ofParameters_[j]->quantile(point[j]);
   }
   return set;
+}
+
+double ParameterDistributions::valueAt(std::size_t j, std::span<const double> point) const {
+  if (!copula_ || !copula_->isCorrelated(j)) return ofParameters_[j]->quantile(point[j]);
+  return ofParameters_[j]->atScore(copula_->correlatedAt(j, scoresOf(point, j)));
+}
+
+void ParameterDistributions::move(ParameterSet& set, std::size_t j, std::span<const double> point) const {
+  assert(set.size() == size() && point.size() == size());
+  if (!copula_ || !copula_->isCorrelated(j)) {
+    set[j] = ofParameters_[j]->quantile(point[j]);
+    return;
+  }
+  const std::vector<double> scores = scoresOf(point, size());
+  for (const std::size_t k : copula_->correlatedOnes()) {
+    if (k >= j) set[k] = ofParameters_[k]->atScore(copula_->correlatedAt(k, scores));
+  }
+}
+
+std::vector<double> ParameterDistributions::scoresOf(std::span<const double> point, std::size_t last) const {
+  std::vector<double> scores(size(), 0.0);
+  for (const std::size_t k : copula_->correlatedOnes()) {
+    if (k > last) break;
+    int fault = 0;
+    scores[k] = normalQuantile(point[k], fault);
+  }
+  return scores;
 }
 
 double ParameterDistributions::logDensity(std::span<const double> set) const {

@@ -27,6 +27,10 @@ class ParameterDistributions final {
   /// The set, on the search scale, at a point of the open unit cube (p coordinates): the inverse of the distribution
   /// functions, the k-th coordinate being that of the k-th parameter given those before it.
   ParameterSet setAt(std::span<const double> point) const;
+  /// The value of parameter j in that set.
+  double valueAt(std::size_t j, std::span<const double> point) const;
+  /// Makes of the set at another point, which differs in coordinate j alone, that at this one.
+  void move(ParameterSet& set, std::size_t j, std::span<const double> point) const;
   /// The natural logarithm of the density at a set of the search scale, normalised; -infinity where it is 0. Of a
   /// parameter without a density its probability is taken; a correlated one must have a density.
   double logDensity(std::span<const double> set) const;
@@ -40,6 +44,9 @@ class ParameterDistributions final {
   const std::optional<GaussianCopula>& copula() const { return copula_; }
 
  private:
+  /// The independent scores of the correlated coordinates up to `last`; of others 0.
+  std::vector<double> scoresOf(std::span<const double> point, std::size_t last) const;
+
   std::vector<DistributionPointer> ofParameters_;
   std::optional<GaussianCopula> copula_;
 };

@@ -76,6 +76,26 @@ TEST(ParameterDistributions, ReachTheirMomentsAndCorrelations) {
   }
 }
 
+TEST(ParameterDistributions, SingleValuesAndMovesAreThoseOfTheWholeSet) {
+  const std::vector<DistributionPointer> ofParameters{normalDistribution(5, 2), lognormal(0, 0.5), triangular(0, 1, 5),
+                                                      betaDistribution(2, 5, 0, 1)};
+  UniformGenerator random(8);
+  for (const ParameterDistributions& distributions :
+       {ParameterDistributions(ofParameters),
+        ParameterDistributions(ofParameters,
+                               copulaOf({{1, 0, 0.7, 0.2}, {0, 1, 0, 0}, {0.7, 0, 1, -0.3}, {0.2, 0, -0.3, 1}}))}) {
+    std::vector<double> point{0.2, 0.4, 0.6, 0.8};
+    ParameterSet moving = distributions.setAt(point);
+    for (int i = 0; i < 40; ++i) {
+      const auto j = static_cast<std::size_t>(i % 4);
+      point[j] = random.next();
+      distributions.move(moving, j, point);
+      EXPECT_EQ(moving, distributions.setAt(point));
+      for (std::size_t k = 0; k < 4; ++k) EXPECT_EQ(distributions.valueAt(k, point), moving[k]);
+    }
+  }
+}
+
 TEST(ParameterDistributions, DensityOfCorrelatedNormalsIsThatOfTheirJointOne) {
   const double r = 0.6;
   const ParameterDistributions joint({normalDistribution(1, 2), normalDistribution(-1, 0.5)},
