@@ -3,8 +3,10 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
+#include <limits>
 #include <numeric>
 #include <optional>
+#include <utility>
 
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/uniform_generator.h"
@@ -55,24 +57,38 @@ Moments momentsOf(const Sums& s) {
   return m;
 }
 
-/// One parameter's effects, 0 where they are not known.
+/// The power of 2 next below x; 1 for 0. Multiples of it are exact.
+double powerOfTwoOf(double x) {
+  return x > 0.0 ? std::ldexp(1.0, std::ilogb(x)) : 1.0;
+}
+
+/// One parameter's effects, 0 where they are not known, in units of `scale`: powers of the effects themselves might
+/// leave the range of numbers.
 struct Column {
+  double scale = 1.0;
   std::vector<double> known;     ///< 1 or 0
   std::vector<double> effect;    ///< centred
   std::vector<double> absolute;  ///< centred
   double count = 0.0;
   double mu = 0.0;
   double muStar = 0.0;
+  double largest = 0.0;  ///< of the absolute effects
   bool isConstant = true;
   bool isConstantAbsolute = true;
 };
 
 Column columnOf(const EffectRows& effects, std::size_t j) {
   Column c;
+  double largest = 0.0;
+  for (const std::vector<double>& row : effects) {
+    if (std::isfinite(row[j])) largest = std::max(largest, std::abs(row[j]));
+  }
+  c.scale = powerOfTwoOf(largest);
+  c.largest = largest / c.scale;
   for (const std::vector<double>& row : effects) {
     const bool isKnown = std::isfinite(row[j]);
     c.known.push_back(isKnown ? 1.0 : 0.0);
-    c.effect.push_back(isKnown ? row[j] : 0.0);
+    c.effect.push_back(isKnown ? row[j] / c.scale : 0.0);
     c.count += c.known.back();
     c.mu += c.effect.back();
     c.muStar += std::abs(c.effect.back());
@@ -145,15 +161,33 @@ double shareError(const Sums& s, double muStar, double referenceMuStar, const Su
   return std::sqrt(std::max(0.0, (own + other - 2.0 * both) * scale));
 }
 
+/// Calls with first and end of each run of positions in `order`, in which values descend, whose values are equal but
+/// for rounding.
+template <class Value, class Call>
+void forEachTie(std::span<const std::size_t> order, std::span<const Value> values, const Call& call) {
+  constexpr Value kNearest = std::max(static_cast<Value>(kRounding), 4 * std::numeric_limits<Value>::epsilon());
+  std::size_t first = 0;
+  for (std::size_t k = 1; k <= order.size(); ++k) {
+    if (k < order.size() && values[order[k - 1]] - values[order[k]] <= kNearest * std::abs(values[order[k - 1]]))
+      continue;
+    call(first, k);
+    first = k;
+  }
+}
+
 class Statistics {
  public:
   Statistics(const EffectRows& effects, const Resamples& resamples, double negligibleShare)
       : resamples_(resamples), negligible_(negligibleShare) {
-    for (std::size_t j = 0; !effects.empty() && j < effects[0].size(); ++j) columns_.push_back(columnOf(effects, j));
+    for (std::size_t j = 0; !effects.empty() && j < effects[0].size(); ++j) {
+      columns_.push_back(columnOf(effects, j));
+      if (columns_.back().muStar > 0.0) largestScale_ = std::max(largestScale_, columns_.back().scale);
+    }
   }
 
   OutputEffects compute() {
     found_.parameters.resize(columns_.size());
+    isTied_.assign(columns_.size(), false);
     takeValues();
     shares_.assign(columns_.size(), std::vector<bool>(resamples_.size()));
     muStars_.assign(resamples_.size(), std::vector<float>(columns_.size()));
@@ -161,6 +195,12 @@ class Statistics {
     for (std::size_t first = 0; first < columns_.size(); first += kBlock) resampleBlock(first);
     rankSamples();
     judgeTogether();
+    for (std::size_t j = 0; j < columns_.size(); ++j) {
+      ParameterEffects& p = found_.parameters[j];
+      for (LimitedValue* of : {&p.mu, &p.muStar, &p.sigma}) {
+        for (double* value : {&of->value, &of->lower, &of->upper}) *value *= columns_[j].scale;
+      }
+    }
     return std::move(found_);
   }
 
@@ -173,15 +213,21 @@ class Statistics {
   void rankSamples();
   void judgeTogether();
   Sums sumsOf(const Column& column, std::span<const double> weights) const;
+  /// A value of a column in units that are the same for all.
+  double comparable(const Column& column, double value) const {
+    return value == 0.0 ? 0.0 : value * (column.scale / largestScale_);
+  }
 
   const Resamples& resamples_;
   double negligible_;
   std::vector<Column> columns_;
+  double largestScale_ = 0.0;             ///< of the columns
   std::optional<std::size_t> reference_;  ///< the parameter with the largest mu*
   std::vector<Sums> referenceSums_;       ///< in each sample
   std::vector<double> largest_;           ///< mu* of all parameters in each sample
   Sums referenceSum_;                     ///< in that of all effects
   OutputEffects found_;
+  std::vector<bool> isTied_;                 ///< by parameter, whether another one has its rank
   std::vector<std::vector<bool>> shares_;    ///< by parameter, which samples agree that its share is negligible
   std::vector<std::vector<float>> muStars_;  ///< by sample; enough for ranks
 };
@@ -216,11 +262,12 @@ void Statistics::takeValues() {
     const Column& c = columns_[j];
     ParameterEffects& p = found_.parameters[j];
     p.count = static_cast<std::size_t>(c.count);
-    muStars.push_back(p.count > 0 ? c.muStar : kNaN);
+    muStars.push_back(p.count > 0 ? comparable(c, c.muStar) : kNaN);
     if (p.count == 0) continue;
     p.mu.value = c.mu;
     p.muStar.value = c.muStar;
-    if (!reference_ || c.muStar > columns_[*reference_].muStar) reference_ = j;
+    if (c.muStar > 0.0) p.largestPart = c.largest / (c.muStar * c.count);
+    if (!reference_ || muStars[j] > muStars[*reference_]) reference_ = j;
   }
   if (reference_ && columns_[*reference_].muStar == 0.0) reference_.reset();
   std::vector<std::size_t> order(columns_.size());
@@ -228,13 +275,16 @@ void Statistics::takeValues() {
   std::ranges::stable_sort(order, [&](std::size_t a, std::size_t b) {
     return muStars[a] > muStars[b] || (std::isnan(muStars[b]) && !std::isnan(muStars[a]));
   });
-  for (std::size_t k = 0; k < order.size(); ++k) {
-    if (!std::isnan(muStars[order[k]])) found_.parameters[order[k]].rank = k + 1;
-  }
+  forEachTie<double>(order, muStars, [&](std::size_t first, std::size_t end) {
+    for (std::size_t k = first; k < end && !std::isnan(muStars[order[k]]); ++k) {
+      found_.parameters[order[k]].rank = first + 1;
+      if (end - first > 1) isTied_[order[k]] = true;
+    }
+  });
   if (!reference_) return;
   for (std::size_t j = 0; j < columns_.size(); ++j) {
     ParameterEffects& p = found_.parameters[j];
-    if (p.count > 0) p.share.value = p.muStar.value / columns_[*reference_].muStar;
+    if (p.count > 0) p.share.value = muStars[j] / muStars[*reference_];
   }
   const Column& c = columns_[*reference_];
   const std::vector<double> once(c.known.size(), 1.0);
@@ -257,7 +307,7 @@ void Statistics::takeLargest() {
         n += resamples_[b][t] * c.known[t];
         sum += resamples_[b][t] * c.absolute[t];
       }
-      if (n > 0.0) largest_[b] = std::max(largest_[b], c.muStar + sum / n);
+      if (n > 0.0) largest_[b] = std::max(largest_[b], comparable(c, c.muStar + sum / n));
     }
   }
 }
@@ -279,7 +329,7 @@ void Statistics::takeReplicates(std::size_t j, std::vector<Sums>& sums) {
   const Column& c = columns_[j];
   ParameterEffects& p = found_.parameters[j];
   for (std::size_t b = 0; b < sums.size(); ++b) {
-    const double muStar = sums[b].n > 0.0 ? c.muStar + sums[b].absolute / sums[b].n : -1.0;
+    const double muStar = sums[b].n > 0.0 ? comparable(c, c.muStar + sums[b].absolute / sums[b].n) : -1.0;
     muStars_[b][j] = static_cast<float>(muStar);
   }
   if (p.count < 2) return;
@@ -341,7 +391,7 @@ void Statistics::takeShare(std::size_t j, std::span<const Sums> sums) {
     if (sums[b].n < 2.0 || referenceSums_[b].n < 2.0) continue;
     const double muStar = std::max(0.0, c.muStar + sums[b].absolute / sums[b].n);
     const double other = reference.muStar + referenceSums_[b].absolute / referenceSums_[b].n;
-    const double value = muStar / largest_[b];
+    const double value = comparable(c, muStar) / largest_[b];
     const double deviation = std::log(value) - logShare;
     const double ofSample = shareError(sums[b], muStar, other, referenceSums_[b]);
     const bool hasError = hasErrors && share.add(value, deviation, ofSample);
@@ -375,17 +425,23 @@ void Statistics::rankSamples() {
   }
   if (resamples_.empty() || known == 0 || !reference_) return;
   std::vector<std::size_t> holding(p);
-  std::vector<std::vector<std::uint32_t>> ranks(p);
+  std::vector<std::vector<std::uint32_t>> ranks(p);  // the lowest and the highest that a parameter may have
+  std::vector<std::vector<std::uint32_t>> highest(p);
   std::size_t sameTop = 0;
   std::vector<std::size_t> order(p);
   for (const std::vector<float>& muStars : muStars_) {
     std::iota(order.begin(), order.end(), std::size_t{0});
     std::ranges::stable_sort(order, [&](std::size_t a, std::size_t b) { return muStars[a] > muStars[b]; });
     bool isSameTop = true;
+    forEachTie<float>(order, muStars, [&](std::size_t first, std::size_t end) {
+      for (std::size_t k = first; k < end; ++k) {
+        ranks[order[k]].push_back(static_cast<std::uint32_t>(first + 1));
+        highest[order[k]].push_back(static_cast<std::uint32_t>(end));
+        if (end - first == 1 && found_.parameters[order[k]].rank == end) ++holding[order[k]];
+      }
+    });
     for (std::size_t k = 0; k < p; ++k) {
       const std::size_t rank = found_.parameters[order[k]].rank;
-      ranks[order[k]].push_back(static_cast<std::uint32_t>(k + 1));
-      if (rank == k + 1) ++holding[order[k]];
       if (k < found_.topCount && (rank == 0 || rank > found_.topCount)) isSameTop = false;
     }
     if (isSameTop) ++sameTop;
@@ -395,11 +451,13 @@ void Statistics::rankSamples() {
   for (std::size_t j = 0; j < p; ++j) {
     ParameterEffects& one = found_.parameters[j];
     if (one.count < kFewestEffects) continue;
-    one.rankStability = static_cast<double>(holding[j]) / count;
-    std::ranges::sort(ranks[j]);
-    const auto at = [&](double share) { return ranks[j][static_cast<std::size_t>(share * (count - 1.0))]; };
-    one.rankLower = at(kTail);
-    one.rankUpper = at(1.0 - kTail);
+    if (!isTied_[j]) one.rankStability = static_cast<double>(holding[j]) / count;
+    const auto at = [&](std::vector<std::uint32_t>& of, double share) {
+      std::ranges::sort(of);
+      return of[static_cast<std::size_t>(share * (count - 1.0))];
+    };
+    one.rankLower = at(ranks[j], kTail);
+    one.rankUpper = at(highest[j], 1.0 - kTail);
   }
 }
 

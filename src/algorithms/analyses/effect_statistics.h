@@ -31,10 +31,14 @@ struct ParameterEffects {
   /// where all effects are 0.
   double certainty = std::numeric_limits<double>::quiet_NaN();
   ScreeningVerdict verdict = ScreeningVerdict::none;
-  std::size_t rank = 0;  ///< by mu*, from 1; 0: it has no effects
+  /// The largest of the absolute effects over their sum: near 1, mu* is that of one step.
+  double largestPart = std::numeric_limits<double>::quiet_NaN();
+  /// By mu*, from 1; 0: it has no effects. Parameters with the same mu* have the same rank, the lowest of theirs.
+  std::size_t rank = 0;
   std::size_t rankLower = 0;
   std::size_t rankUpper = 0;
-  double rankStability = std::numeric_limits<double>::quiet_NaN();  ///< share of the bootstrap samples with this rank
+  /// Share of the bootstrap samples with this rank; NaN where another parameter has it, too.
+  double rankStability = std::numeric_limits<double>::quiet_NaN();
 };
 
 /// Those of all parameters on one output.

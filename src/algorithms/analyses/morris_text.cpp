@@ -18,6 +18,7 @@ constexpr int kFewTrajectories = 10;     // with fewer the limits are too narrow
 constexpr double kMostFurther = 100.0;   // times the trajectories: more are not worth naming
 constexpr double kStable = 0.95;
 constexpr double kTail = 0.05;
+constexpr double kNearlyAll = 0.9;  // of mu*, of one effect
 
 std::string percent(double share) {
   const double value = 100.0 * share;
@@ -39,6 +40,7 @@ struct Texts {
   void appendTable(const ScreenedOutput& output, std::span<const std::size_t> order, std::string_view file);
   void appendVerdicts(const ScreenedOutput& output, std::span<const std::size_t> order);
   void appendRanking(const ScreenedOutput& output);
+  void appendSingleEffects(const ScreenedOutput& output, std::span<const std::size_t> order);
 };
 
 std::vector<std::size_t> byRank(const OutputEffects& effects) {
@@ -144,6 +146,23 @@ void Texts::appendRanking(const ScreenedOutput& output) {
   }
 }
 
+/// Of a few effects the largest may well be most of the sum.
+void Texts::appendSingleEffects(const ScreenedOutput& output, std::span<const std::size_t> order) {
+  std::string parameters;
+  std::size_t count = 0;
+  for (const std::size_t j : order) {
+    const ParameterEffects& p = output.effects.parameters[j];
+    if (p.count < kFewestEffects || !(p.largestPart > kNearlyAll) || p.share.value < settings.negligibleShare) continue;
+    if (++count <= kMostNamed) parameters += (count == 1 ? "" : ", ") + names.parameters[j];
+  }
+  if (count == 0) return;
+  if (count > kMostNamed) parameters += fmt::format(" and {} more", count - kMostNamed);
+  lines.push_back(
+      fmt::format("Warning: A single effect on {} makes more than 90 % of the mu* of {}: see whether the value of that "
+                  "run is what the model should yield. Other points may give another mu*",
+                  output.name, parameters));
+}
+
 void appendStepProblems(const EffectPlan& plan, const AnalysisNames& names, std::vector<std::string>& lines) {
   const std::size_t r = plan.trajectories.size();
   for (std::size_t j = 0; j < names.parameters.size(); ++j) {
@@ -231,6 +250,7 @@ std::vector<std::string> formatMorris(const MorrisOutcome& outcome, const Effect
       texts.lines.push_back(
           fmt::format("   Which parameters can be fixed is not said: that takes {} effects of each", kFewestEffects));
     } else {
+      texts.appendSingleEffects(output, order);
       texts.appendVerdicts(output, order);
       texts.appendRanking(output);
     }

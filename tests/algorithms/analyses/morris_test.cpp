@@ -1,8 +1,11 @@
 #include "algorithms/analyses/morris.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <map>
+#include <memory>
+#include <optional>
 #include <set>
 
 #include <gmock/gmock.h>
@@ -155,6 +158,50 @@ TEST(ElementaryEffects, StartEquallyOftenAtAllLevelsAndTheTrajectoriesTakenAreMo
     return least;
   };
   EXPECT_GT(nearest(500), 2.0 * nearest(1));
+}
+
+/// A uniform distribution that counts how often it is asked for a value.
+class CountedDistribution final : public Distribution {
+ public:
+  explicit CountedDistribution(int& count) : count_(count) {}
+  std::string_view name() const override { return "counted"; }
+  std::string text() const override { return ""; }
+  double cumulative(double x) const override { return x; }
+  double quantile(double p) const override {
+    ++count_;
+    return p;
+  }
+  double logDensity(double /*x*/) const override { return 0.0; }
+
+ private:
+  int& count_;
+};
+
+// Quantiles such as those of a beta distribution take their time.
+TEST(ElementaryEffects, TakeAFewQuantilesForEachStep) {
+  constexpr std::size_t kSize = 300;
+  constexpr int kTrajectories = 5;
+  constexpr int kSteps = static_cast<int>(kSize) * kTrajectories;
+  std::vector<std::vector<double>> correlations(kSize, std::vector<double>(kSize, 0.0));
+  for (std::size_t j = 0; j < kSize; ++j) correlations[j][j] = 1.0;
+  correlations[3][8] = correlations[8][3] = 0.5;
+  for (const TransformationType type : {TransformationType::none, TransformationType::integer}) {
+    SearchSpace space = spaceOf(kSize);
+    space.transformation.assign(kSize, type);
+    for (const bool isCorrelated : {false, true}) {
+      for (const EffectDesign design : kDesigns) {
+        int count = 0;
+        const auto counted = std::make_shared<CountedDistribution>(count);
+        const ParameterDistributions distributions(
+            std::vector<DistributionPointer>(kSize, counted),
+            isCorrelated ? std::optional(GaussianCopula(correlations, space.names)) : std::nullopt);
+        const EffectPlan plan = planEffects({.design = design, .trajectories = kTrajectories, .candidates = 1}, space,
+                                            distributions, 1, feasibleWhere([](const auto&) { return true; }, ""));
+        for (const EffectTrajectory& trajectory : plan.trajectories) setsOf(plan, trajectory, distributions);
+        EXPECT_LT(count, 200 * kSteps) << isCorrelated << static_cast<int>(type);
+      }
+    }
+  }
 }
 
 // Steps of one width do not see what repeats itself at that distance.
@@ -345,6 +392,71 @@ TEST(EffectStatistics, TheVerdictIsOfTheLimitsAndNotOfTheValue) {
   EXPECT_GT(found.trajectoriesToDecide, static_cast<double>(kTrajectories));
   EXPECT_EQ(p[0].rankStability, 1.0);
   EXPECT_EQ(p[3].rank, 2U);
+}
+
+TEST(EffectStatistics, ParametersWithEqualMuStarShareARankThatIsNotCertain) {
+  UniformGenerator random(5);
+  EffectRows effects(10, std::vector<double>(6, 0.0));
+  for (std::vector<double>& row : effects) row = {5.0 + random.next(), 0.0, 1.0, 0.0, 1.0 + 1e-14, std::nan("")};
+  const OutputEffects found = effectStatistics(effects, drawResamples(10, 200, 1), 0.1);
+  const std::array<std::array<std::size_t, 3>, 6> expected{{{1, 1, 1}, {4, 4, 5}, {2, 2, 3}, {4, 4, 5}, {2, 2, 3}, {}}};
+  for (std::size_t j = 0; j < 6; ++j) {
+    const ParameterEffects& p = found.parameters[j];
+    EXPECT_EQ((std::array{p.rank, p.rankLower, p.rankUpper}), expected[j]) << j;
+    EXPECT_EQ(std::isnan(p.rankStability), j != 0) << j;
+  }
+  EXPECT_EQ(found.topCount, 3U);
+  EXPECT_EQ(found.topStability, 1.0);
+}
+
+// Powers of such effects are no numbers, or 0.
+TEST(EffectStatistics, DoNotDependOnTheUnitOfTheOutput) {
+  constexpr std::size_t kTrajectories = 12;
+  UniformGenerator random(7);
+  EffectRows effects(kTrajectories, std::vector<double>(4));
+  for (std::vector<double>& row : effects) {
+    row = {4.0 + random.next(), skewedEffect(random), 0.2 * random.next(), 0.0};
+  }
+  const Resamples resamples = drawResamples(kTrajectories, 300, 1);
+  const OutputEffects expected = effectStatistics(effects, resamples, 0.1);
+  for (const int exponent : {700, 1000, -700, -1000}) {
+    EffectRows scaled = effects;
+    for (std::vector<double>& row : scaled) {
+      for (double& effect : row) effect = std::ldexp(effect, exponent);
+    }
+    const OutputEffects found = effectStatistics(scaled, resamples, 0.1);
+    for (std::size_t j = 0; j < 4; ++j) {
+      const ParameterEffects& p = found.parameters[j];
+      const ParameterEffects& of = expected.parameters[j];
+      for (const auto value : {&ParameterEffects::mu, &ParameterEffects::muStar, &ParameterEffects::sigma}) {
+        for (const auto part : {&LimitedValue::value, &LimitedValue::lower, &LimitedValue::upper}) {
+          EXPECT_EQ(p.*value.*part, std::ldexp(of.*value.*part, exponent)) << exponent << " " << j;
+        }
+      }
+      EXPECT_EQ(p.share.lower, of.share.lower) << exponent << " " << j;
+      EXPECT_EQ(p.share.upper, of.share.upper) << exponent << " " << j;
+      EXPECT_EQ(p.verdict, of.verdict);
+      EXPECT_EQ(p.rank, of.rank);
+      EXPECT_EQ(p.rankUpper, of.rankUpper);
+    }
+  }
+}
+
+TEST(ElementaryEffects, OfOneRunFarFromAllOthersAreWarnedOf) {
+  const SearchSpace space = spaceOf(3);
+  const MorrisSettings settings{.trajectories = 20};
+  for (const double far : {1.0, 1.0e6, 1.0e160}) {
+    const Screening found = screen(settings, space, [far](int number, const auto& x) {
+      return resultOf(number == 18 ? far : x[0] + x[1] * x[2]);  // the second set of a trajectory
+    });
+    const ParameterEffects& first = found.outcome.outputs.at(0).effects.parameters[0];
+    EXPECT_TRUE(std::isfinite(first.sigma.value));
+    EXPECT_EQ(first.largestPart > 0.9, far > 1.0);
+    std::string log;
+    for (const std::string& line : formatMorris(found.outcome, found.plan, settings, {space.names, {"y"}, {}}, ""))
+      log += line;
+    EXPECT_EQ(log.find("A single effect on y makes more than 90 % of the mu* of p0: ") != std::string::npos, far > 1.0);
+  }
 }
 
 }  // namespace
