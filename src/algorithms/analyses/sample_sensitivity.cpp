@@ -196,7 +196,9 @@ void addFirstOrder(const std::vector<Order>& orders, const Columns& outputs, std
   WeightedOutputs weighted(outputs);
   const std::size_t n = weighted.rowCount();
   const FirstOrder firstOrder(n);
+  const auto isVaried = [&](std::size_t j) { return orders[j].ends.size() > 1; };
   for (std::size_t j = 0; j < orders.size(); ++j) {
+    if (!isVaried(j)) continue;
     const std::vector<double> indices = firstOrder.of(orders[j], weighted);
     for (std::size_t q = 0; q < found.size(); ++q) found[q]->parameters[j].firstOrder = indices[q];
   }
@@ -227,7 +229,7 @@ void addFirstOrder(const std::vector<Order>& orders, const Columns& outputs, std
       SampleDependence& one = found[q]->parameters[j];
       one.lower = one.firstOrder - margin;
       one.upper = one.firstOrder + margin;
-      if (std::isnan(variance)) one.lower = one.upper = kNaN;
+      if (std::isnan(variance) || !isVaried(j)) one.lower = one.upper = kNaN;
     }
   }
 }
@@ -247,6 +249,7 @@ void addDependences(const Columns& parameters, const std::vector<std::size_t>& r
     const std::vector<double> ranks = ranksOf(order);
     for (std::size_t q = 0; q < found.size(); ++q) {
       found[q]->parameters[j].rankCorrelation = sampleCorrelation(ranks, outputRanks[q]);
+      found[q]->parameters[j].isVaried = order.ends.size() > 1;
     }
   }
   if (rows.size() >= kLeastForIndices) addFirstOrder(orders, outputs, seed, found);
@@ -271,15 +274,22 @@ void appendJudgement(const OutputDependence& output, const AnalysisNames& names,
   constexpr double kNegligible = 0.05;
   constexpr double kWide = 0.1;
   std::string negligible;
+  std::string constant;
   std::size_t others = 0;
+  std::size_t constants = 0;
+  const auto add = [&](std::string& list, std::size_t& count, std::size_t j) {
+    if (count++ < kMostShownParameters) list += (list.empty() ? "" : ", ") + names.parameters[j];
+  };
   double widest = 0.0;
   for (std::size_t j = 0; j < output.parameters.size(); ++j) {
     const SampleDependence& one = output.parameters[j];
     widest = std::fmax(widest, 0.5 * (one.upper - one.lower));
-    if (!(one.upper < kNegligible)) continue;
-    if (others++ < kMostShownParameters) negligible += (negligible.empty() ? "" : ", ") + names.parameters[j];
+    if (!one.isVaried) add(constant, constants, j);
+    if (one.upper < kNegligible) add(negligible, others, j);
   }
   if (others > kMostShownParameters) negligible += fmt::format(" and {} more", others - kMostShownParameters);
+  if (constants > kMostShownParameters) constant += fmt::format(" and {} more", constants - kMostShownParameters);
+  if (!constant.empty()) lines.push_back("   Not varied in this sample, which says nothing of them: " + constant);
   if (!negligible.empty()) {
     lines.push_back(
         fmt::format("   Less than {:g} of the variance each, by themselves: {}; what they do together with "

@@ -18,10 +18,12 @@ namespace mirevo {
 struct SampleDependence {
   double rankCorrelation = 0.0;  ///< Spearman; NaN where the output or the parameter is constant
   /// First-order sensitivity index, the share of the output's variance that the parameter explains by itself, with its
-  /// 95 % limits; NaN for a sample that is too small. The estimate has no bias at 0, and so may be below it.
+  /// 95 % limits; NaN for a sample that is too small, and of a parameter with one value. The estimate has no bias at 0,
+  /// and so may be below it.
   double firstOrder = 0.0;
   double lower = 0.0;
   double upper = 0.0;
+  bool isVaried = true;  ///< it has more than one value: else there is no index
 };
 
 /// One output of the runs that succeeded and have a value of it.

@@ -95,6 +95,22 @@ TEST(SampleSensitivity, OfFewValuesIsThatOfTheirClasses) {
   EXPECT_NEAR(found.outputs[0].parameters[1].rankCorrelation, std::sqrt(0.75), 0.01);
 }
 
+TEST(SampleSensitivity, OfAParameterThatIsNotVariedIsUnknown) {
+  const SearchSpace space = spaceBetween(2, 0, 1);
+  UncertaintyOutcome outcome = sampleOf(
+      space, 200, [](std::span<const double> x) { return x[0]; }, 3);
+  for (ParameterSet& set : outcome.sample) set[1] = 0.5;
+  const AnalysisNames names{{"a", "b"}, {}, {"fit"}};
+  const SampleSensitivity found = sampleSensitivity(outcome, space, names, 1);
+  const SampleDependence& b = found.outputs[0].parameters[1];
+  for (const double value : {b.firstOrder, b.lower, b.upper, b.rankCorrelation}) EXPECT_TRUE(std::isnan(value));
+  EXPECT_GT(found.outputs[0].parameters[0].lower, 0.9);
+  std::string text;
+  for (const std::string& line : formatSampleSensitivity(found, names, "x.dat", false)) text += line + "\n";
+  EXPECT_THAT(text, HasSubstr("   Not varied in this sample, which says nothing of them: b\n"));
+  EXPECT_THAT(text, Not(HasSubstr("Less than")));
+}
+
 TEST(SampleSensitivity, RankCorrelationIsThatOfRanksWithTies) {
   const SearchSpace space = spaceBetween(1, 0, 10);
   UncertaintyOutcome outcome;
