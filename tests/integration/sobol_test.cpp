@@ -24,6 +24,11 @@ double sobolCell(const std::string& text, const std::vector<std::string>& first,
   return std::nan("");
 }
 
+struct ExpectedIndex {
+  double value;
+  double error;  ///< root mean square
+};
+
 /// A folder in which the model is a function of x1, x2 ..., whose value is the measure.
 class SobolFunctionFolder : public ModelFolder {
  public:
@@ -58,20 +63,25 @@ class SobolFunctionFolder : public ModelFolder {
   double index(const std::string& parameter, const std::string& order, const std::string& column = "Index") const {
     return sobolCell(read("basin_Sobol.dat"), {"objective", "fit", parameter, "", order}, column);
   }
+  /// Within three standard errors and between its limits.
+  void expectIndex(const std::string& parameter, const std::string& order, const ExpectedIndex& expected) const {
+    EXPECT_NEAR(index(parameter, order), expected.value, 3.0 * expected.error) << parameter << " " << order;
+    EXPECT_LE(index(parameter, order, "Lower"), expected.value) << parameter << " " << order;
+    EXPECT_GE(index(parameter, order, "Upper"), expected.value) << parameter << " " << order;
+  }
 };
 
 TEST(SobolRun, OfTheIshigamiFunctionThroughTheWholeProgram) {
   const SobolFunctionFolder folder("ishigami", 3, -M_PI, M_PI, "Sample_Size = 256");
   const ProgramResult run = folder.run();
   ASSERT_EQ(run.exitCode, 0) << run.error;
-  const std::vector<std::pair<double, double>> expected{{0.3139, 0.5576}, {0.4424, 0.4424}, {0.0, 0.2437}};
+  // Errors between those that sobol_coverage has for 128 and for 512 blocks.
+  const ExpectedIndex first[] = {{0.3139, 0.062}, {0.4424, 0.057}, {0.0, 0.062}};
+  const ExpectedIndex total[] = {{0.5576, 0.075}, {0.4424, 0.032}, {0.2437, 0.031}};
   for (std::size_t j = 0; j < 3; ++j) {
     const std::string name = fmt::format("x{}", j + 1);
-    // Three standard errors of so many blocks.
-    EXPECT_NEAR(folder.index(name, "first"), expected[j].first, 0.2) << name;
-    EXPECT_NEAR(folder.index(name, "total"), expected[j].second, 0.2) << name;
-    EXPECT_LE(folder.index(name, "total", "Lower"), expected[j].second) << name;
-    EXPECT_GE(folder.index(name, "total", "Upper"), expected[j].second) << name;
+    folder.expectIndex(name, "first", first[j]);
+    folder.expectIndex(name, "total", total[j]);
     EXPECT_EQ(folder.index(name, "total", "Blocks"), 256.0);
   }
   const ReadTable stages = readDataTable(folder.read("basin_SobolConvergence.dat"));
@@ -85,15 +95,14 @@ TEST(SobolRun, OfTheGFunctionOfWhichATenthOfTheRunsFails) {
   folder.write("model/parameters.tpl", folder.read("model/parameters.tpl") + "fail-share = 0.092\n");
   const ProgramResult run = folder.run();
   ASSERT_EQ(run.exitCode, 0) << run.error;
-  const std::vector<double> first{0.7162, 0.1790, 0.0237, 0.0072, 0.0001};
-  const std::vector<double> total{0.7871, 0.2422, 0.0343, 0.0105, 0.0001};
-  for (std::size_t j = 0; j < first.size(); ++j) {
+  // Errors that sobol_coverage has for 128 blocks with a tenth of the runs failing.
+  const ExpectedIndex first[] = {{0.7162, 0.138}, {0.1790, 0.072}, {0.0237, 0.026}, {0.0072, 0.018}, {0.0001, 0.0014}};
+  const ExpectedIndex total[] = {
+      {0.7871, 0.131}, {0.2422, 0.033}, {0.0343, 0.0072}, {0.0105, 0.0018}, {0.0001, 0.00005}};
+  for (std::size_t j = 0; j < std::size(first); ++j) {
     const std::string name = fmt::format("x{}", j + 1);
-    // Three standard errors of so many blocks.
-    EXPECT_NEAR(folder.index(name, "first"), first[j], 0.36) << name;
-    EXPECT_NEAR(folder.index(name, "total"), total[j], 0.36) << name;
-    EXPECT_LE(folder.index(name, "total", "Lower"), total[j]) << name;
-    EXPECT_GE(folder.index(name, "total", "Upper"), total[j]) << name;
+    folder.expectIndex(name, "first", first[j]);
+    folder.expectIndex(name, "total", total[j]);
     EXPECT_GT(folder.index(name, "total", "Blocks"), 128 * 0.72);
     EXPECT_LT(folder.index(name, "first", "Blocks"), 128 * 0.88);
   }
