@@ -247,6 +247,21 @@ TEST(Glue, OfASearchSaysThatItsSetsAreNoSampleOfTheParameters) {
   EXPECT_THAT(log, HasSubstr("\n   Parameter, behavioural "));
 }
 
+TEST(Glue, OfScenariosSaysThatTheirSetsAreNoSampleOfTheParameters) {
+  const GlueFolder folder;
+  folder.writeGlue("Behavioural_Share = 0.2", {.scenarios = {"4, 2, 1", "5, 2, 1", "5, 2, 1"}});
+  folder.editSetup("Option = 3", "Option = 0");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  renameResults(folder, "first");
+  folder.writeGlue("Behavioural_Share = 1\nEarlier_Result_File = 'first.dat'");
+  const ProgramResult run = runProgram({folder / "basin.kdx"});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  EXPECT_THAT(folder.read("basin.log"),
+              AllOf(HasSubstr(" are those of a scenario run, which somebody chose, and no sample of a distribution"),
+                    HasSubstr("\n3 evaluations are taken from ")));
+  EXPECT_FALSE(folder.exists("basin_SampleSensitivities.dat"));
+}
+
 TEST(Glue, OfChainsSaysThatTheirProposalsAreNoSampleOfTheParameters) {
   const GlueFolder folder;
   folder.writeGlue("Behavioural_Share = 0.2");

@@ -71,8 +71,14 @@ std::string settingsPathOf(const std::string& resultFile) {
   return pathBesideResults(resultFile, run_files::restartFile("_Restart"));
 }
 
+bool isOfScenarios(const RestartSettings& then) {
+  return std::ranges::any_of(
+      then.settings, [](const ResultSetting& setting) { return setting.keyword == "Option" && setting.value == "0"; });
+}
+
 /// Of an earlier run, whether its sets are no sample of a distribution, and why.
 std::string notSampled(const RestartSettings& then) {
+  if (isOfScenarios(then)) return "scenario run, which somebody chose,";
   for (const ResultSetting& setting : then.settings) {
     if (setting.keyword == "Option" && setting.value == "1") {
       return "sensitivity analysis, which change one parameter or few,";
@@ -121,7 +127,7 @@ void compareSettings(const std::string& resultFile, const std::optional<RestartS
 }
 
 ResultRows readRows(const std::string& file, const std::string& text, const RunConfig& config,
-                    const ResultColumns& columns, bool isSample, EarlierSample& found) {
+                    const ResultColumns& columns, bool countsRepeats, EarlierSample& found) {
   ResultRows rows;
   const ResultTable table = readResultTable(text, columns, rows);
   if (!table.hasHeader)
@@ -143,9 +149,10 @@ ResultRows readRows(const std::string& file, const std::string& text, const RunC
         fmt::format("Lines of {} that are cut off or damaged are passed over: {}", file, table.unusableLines));
   }
   rows.putInOrder();
-  // A sample draws a likely set more than once, and its weight is as often counted. A search has a set again where it
+  // A sample draws a likely set more than once, and its weight is as often counted; so is that of a set that somebody
+  // gave more than once. A search has a set again where it
   // has converged, which says nothing of the set.
-  if (!isSample) rows.keepIf([&](std::size_t i) { return rows.repeats(i).value_or(0) == 0; });
+  if (!countsRepeats) rows.keepIf([&](std::size_t i) { return rows.repeats(i).value_or(0) == 0; });
   return rows;
 }
 
@@ -196,8 +203,8 @@ EarlierSample readEarlierSample(const std::string& resultFile, const RunConfig& 
   auto text = readTextFile(resultFile, reason);
   if (!text) refuse(resultFile, reason);
   const auto then = parseRestartSettings(readFileIfThere(settingsPathOf(resultFile)).value_or(""));
-  const bool isSample = !then || notSampled(*then).empty();
-  const ResultRows rows = readRows(resultFile, *text, config, resultColumns(config, space), isSample, found);
+  const bool countsRepeats = !then || isOfScenarios(*then) || notSampled(*then).empty();
+  const ResultRows rows = readRows(resultFile, *text, config, resultColumns(config, space), countsRepeats, found);
   text.reset();
   addRows(rows, found.sample);
   const auto succeeded = std::ranges::count(found.sample.ok, true);
