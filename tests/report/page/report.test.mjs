@@ -117,6 +117,31 @@ test('a chart zooms by dragging and by the wheel, is reset, and changes to a log
   });
 });
 
+test('what can be fixed is not said to be surer than the sample can show', async () => {
+  const screening = sample.dataOf('screening');
+  const template = screening.morris[0].parameters[0];
+  const fixed = (name, more) => ({ ...template, name, verdict: 'fix', share: [0.01, 0.01, 0.02], muStar: [1, 1, 1], effects: 30, ...more });
+  for (const one of screening.morris) {
+    one.parameters = [fixed('inert', { muStar: [0, 0, 0], certainty: null }), fixed('weak', { certainty: 1 }), fixed('some', { certainty: 0.98 })];
+  }
+  await withReport(screening, {}, async (page) => {
+    const text = await page.locator('#morris').textContent();
+    assert.match(text, /Without any effect in 30 or more steps: what acts in less than 9\.5 % of the space may have gone unseen/);
+    assert.match(text, /weak\u2069 \(at most 2 % of the largest \u03bc\*, in all bootstrap samples\)/);
+    assert.match(text, /some\u2069 \(at most 2 % of the largest \u03bc\*, sure to 98 %\)/);
+  });
+  const sobol = sample.dataOf('sobol');
+  const [first, second] = sobol.sobol.outputs = [sobol.sobol.outputs.at(-1), structuredClone(sobol.sobol.outputs.at(-1))];
+  first.total = first.total.map((index, place) => (place === 0 ? [0, 0, 0, 64] : index));
+  second.name = 'another';
+  for (const key of ['first', 'total', 'interactions', 'sumOfFirst']) second[key] = second[key].map(([value, , , blocks]) => [value, null, null, blocks]);
+  await withReport(sobol, {}, async (page) => {
+    const text = await page.locator('#sobol').textContent();
+    assert.match(text, /Can be fixed, .*\(no effect in any block\)\. What acts in less than 4\.57 % of the space may have gone unseen in 64 blocks/);
+    assert.match(text, /anotherWhich parameters can be fixed is not said, as the indices have no limits/);
+  });
+});
+
 test('the views below a hydrograph are made when they are unfolded, and a series is drawn above it', async () => {
   const data = sample.dataOf('optimisation');
   const [series] = data.series;

@@ -16,7 +16,9 @@ const ranked = ({ parameters }: Screening) => [...parameters].sort((a, b) => (a.
 
 const muStarName = 'mean absolute effect, \u03bc*';
 
-const sure = (certainty: Maybe) => (certainty === null ? '' : certainty > 0.999 ? 'more than 99.9 %' : percent(certainty));
+/** Never 100 % for what a number of samples cannot show. */
+const sure = (certainty: Maybe) => (certainty === null ? 'nothing said of how sure that is'
+  : certainty === 1 ? 'in all bootstrap samples' : `sure to ${certainty > 0.999 ? 'more than 99.9 %' : percent(certainty)}`);
 
 function listed(parameters: EffectsOfParameter[], text: (parameter: EffectsOfParameter) => string): string {
   const shown = parameters.slice(0, kMostNamed).map(text).join(', ');
@@ -31,6 +33,8 @@ function statements(screening: Screening): Node[] {
   const of = (verdict: string) => order.filter((parameter) => parameter.verdict === verdict);
   const [fixed, kept, undecided] = [of('fix').reverse(), of('keep'), of('undecided')];
   const acting = fixed.filter(({ muStar }) => muStar[0] !== 0);
+  const inert = fixed.filter(({ muStar }) => muStar[0] === 0);
+  const fewest = Math.min(...inert.map(({ effects }) => effects));
   const limit = percent(screening.negligible);
   if (fixed.length + kept.length + undecided.length === 0) {
     return [paragraph('Which parameters can be fixed is not said: no parameter changes this output, or there are too few effects.')];
@@ -38,8 +42,9 @@ function statements(screening: Screening): Node[] {
   const lines = [fixed.length === 0
     ? make('li', {}, make('strong', {}, 'Can be fixed: '), `none is known to have less than ${limit} of the largest \u03bc*.`)
     : make('li', {}, make('strong', {}, 'Can be fixed: '),
-      `${listed(fixed, (p) => `${nameOf(p)} (${p.muStar[0] === 0 ? 'no effect in any trajectory' : `at most ${percent(p.share[2])} of the largest \u03bc*, sure to ${sure(p.certainty)}`})`)}.`
-      + (acting.length > 1 ? ` All ${count(acting.length)}${acting.length < fixed.length ? ' that have an effect' : ''} together: sure to ${sure(screening.fixedTogether)}.` : ''))];
+      `${listed(fixed, (p) => `${nameOf(p)} (${p.muStar[0] === 0 ? 'no effect in any trajectory' : `at most ${percent(p.share[2])} of the largest \u03bc*, ${sure(p.certainty)}`})`)}.`
+      + (acting.length > 1 ? ` All ${count(acting.length)}${acting.length < fixed.length ? ' that have an effect' : ''} together: ${sure(screening.fixedTogether)}.` : '')
+      + (inert.length > 0 ? ` Without any effect in ${count(fewest)} or more steps: what acts in less than ${percent(1 - 0.05 ** (1 / fewest))} of the space may have gone unseen (95 %).` : ''))];
   if (kept.length > 0) lines.push(make('li', {}, make('strong', {}, 'Must be kept: '), `${listed(kept, nameOf)}.`));
   if (undecided.length > 0) {
     lines.push(make('li', {}, make('strong', {}, 'Undecided: '),

@@ -2,7 +2,7 @@
 import { axis, chart, legend, lineEntries, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import type { Maybe, ReportData, Sobol, SobolIndex, SobolOutput, SobolSeries } from '../data';
 import { make, shorten, table } from '../dom';
-import { count, moment, number } from '../format';
+import { count, moment, number, percent } from '../format';
 import { nearest } from '../lines';
 import { finite } from '../numbers';
 import { extentOf, heatmap } from './heatmap';
@@ -13,7 +13,7 @@ import type { CustomApi } from './uncertainty';
 const kMostLines = 8; // factors with a line of their own
 const kMostRows = 40;
 
-const limits = ([, lower, upper]: SobolIndex) => `${number(lower, 3)} to ${number(upper, 3)}`;
+const limits = ([, lower, upper]: SobolIndex) => (lower === null || upper === null ? 'no limits' : `${number(lower, 3)} to ${number(upper, 3)}`);
 
 /** The places of the factors, that with the largest total index first. */
 function byTotal(output: SobolOutput): number[] {
@@ -160,8 +160,13 @@ function seriesPlan({ factors }: Sobol, series: SobolSeries): ChartPlan {
 /** Which parameters can be fixed, judged by the limits and not by the index alone. */
 function verdict({ factors, negligible }: Sobol, output: SobolOutput): Node {
   const order = byTotal(output);
-  const named = (places: number[]) => places.map((place) => `\u2068${shorten(factors[place]!, 60)}\u2069 (${limits(output.total[place]!)})`).join(', ');
+  const isInert = (place: number) => output.total[place]!.slice(0, 3).every((value) => value === 0);
+  const named = (places: number[]) => places.map((place) => `\u2068${shorten(factors[place]!, 60)}\u2069 (${isInert(place) ? 'no effect in any block' : limits(output.total[place]!)})`).join(', ');
+  if (output.total.every(([value, lower]) => value === null || lower === null)) {
+    return paragraph('Which parameters can be fixed is not said, as the indices have no limits: too few runs succeeded, or a few of them make nearly all of the variance. The log says which.');
+  }
   const fixable = order.filter((place) => (output.total[place]![2] ?? Infinity) < negligible);
+  const fewest = Math.min(...fixable.map((place) => output.total[place]![3]));
   const open = order.filter((place) => {
     const [, lower, upper] = output.total[place]!;
     return lower !== null && upper !== null && lower < negligible && upper >= negligible;
@@ -169,7 +174,7 @@ function verdict({ factors, negligible }: Sobol, output: SobolOutput): Node {
   const interacting = order.filter((place) => (output.interactions[place]![1] ?? 0) > 0 && (output.interactions[place]![0] ?? 0) >= negligible);
   const [sum] = output.sumOfFirst;
   const lines = [
-    fixable.length > 0 ? `Can be fixed, with the limits of the total index: ${named(fixable)}.` : `No parameter has a total index that is below ${number(negligible)} for certain: none can be fixed.`,
+    fixable.length > 0 ? `Can be fixed, with the limits of the total index: ${named(fixable)}. What acts in less than ${percent(1 - 0.05 ** (1 / fewest))} of the space may have gone unseen in ${count(fewest)} blocks (95 %).` : `No parameter has a total index that is below ${number(negligible)} for certain: none can be fixed.`,
     ...(open.length > 0 ? [`Undecided, as the limits include ${number(negligible)}; a larger sample decides: ${named(open)}.`] : []),
     ...(interacting.length > 0 ? [`Interact with others: ${interacting.map((place) => `\u2068${shorten(factors[place]!, 60)}\u2069`).join(', ')}.`] : []),
     ...(sum ? [`By themselves the parameters explain ${number(sum[0], 3)} (${limits(sum)}) of the variance.`] : []),
