@@ -197,7 +197,7 @@ class Statistics {
     judgeTogether();
     for (std::size_t j = 0; j < columns_.size(); ++j) {
       ParameterEffects& p = found_.parameters[j];
-      for (LimitedValue* of : {&p.mu, &p.muStar, &p.sigma}) {
+      for (LimitedValue* of : {&p.mu, &p.muStar}) {
         for (double* value : {&of->value, &of->lower, &of->upper}) *value *= columns_[j].scale;
       }
     }
@@ -335,7 +335,7 @@ void Statistics::takeReplicates(std::size_t j, std::vector<Sums>& sums) {
   if (p.count < 2) return;
   const std::vector<double> once(c.known.size(), 1.0);
   const Moments all = momentsOf(sumsOf(c, once));
-  p.sigma.value = c.isConstant ? 0.0 : all.deviation;
+  p.sigma.value = c.isConstant ? 0.0 : all.deviation * c.scale;  // the logarithm of which does not scale exactly
   if (p.count < kFewestEffects) return;
   Replicates mu{all.deviation / std::sqrt(c.count)};
   Replicates muStar{all.absoluteError};
@@ -345,7 +345,7 @@ void Statistics::takeReplicates(std::size_t j, std::vector<Sums>& sums) {
     const Moments m = momentsOf(sum);
     mu.add(c.mu + m.mean, m.mean - all.mean, m.deviation / std::sqrt(sum.n));
     muStar.add(c.muStar + m.absoluteMean, m.absoluteMean - all.absoluteMean, m.absoluteError);
-    sigma.add(m.deviation, std::log(m.deviation / all.deviation), m.logDeviationError);
+    sigma.add(m.deviation * c.scale, std::log(m.deviation / all.deviation), m.logDeviationError);
   }
   const auto same = [](double x) { return x; };
   const auto atLeast0 = [](double x) { return std::max(0.0, x); };
@@ -358,7 +358,7 @@ void Statistics::takeReplicates(std::size_t j, std::vector<Sums>& sums) {
   if (p.count >= kFewestEffectsForSigma) {
     p.sigma.lower = p.sigma.upper = p.sigma.value;
     if (!c.isConstant) {
-      setLimits(sigma, std::log(all.deviation), exponential, p.sigma);
+      setLimits(sigma, std::log(p.sigma.value), exponential, p.sigma);
     }
   }
   takeShare(j, sums);

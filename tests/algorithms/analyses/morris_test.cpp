@@ -430,7 +430,7 @@ TEST(EffectStatistics, DoNotDependOnTheUnitOfTheOutput) {
       const ParameterEffects& of = expected.parameters[j];
       for (const auto value : {&ParameterEffects::mu, &ParameterEffects::muStar, &ParameterEffects::sigma}) {
         for (const auto part : {&LimitedValue::value, &LimitedValue::lower, &LimitedValue::upper}) {
-          EXPECT_EQ(p.*value.*part, std::ldexp(of.*value.*part, exponent)) << exponent << " " << j;
+          EXPECT_NEAR(std::ldexp(p.*value.*part, -exponent), of.*value.*part, 1e-12) << exponent << " " << j;
         }
       }
       EXPECT_EQ(p.share.lower, of.share.lower) << exponent << " " << j;
