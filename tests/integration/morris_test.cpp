@@ -141,7 +141,7 @@ while test -e ../wait && test $n -gt 20; do sleep 0.05; done)");
     if (!isKilled) {
       EXPECT_THAT(table(), HasSubstr("# Unfinished run: statistics of 20 of 36 evaluations\n"));
       EXPECT_EQ(columnOf(table(), "measure", "Effects"), (std::map<std::string, double>{{"a", 7}, {"b", 6}}));
-      EXPECT_THAT(log(), HasSubstr("Warning: 16 were not made: 11 of 24 effects are left out"));
+      EXPECT_THAT(log(), HasSubstr("Warning: 16 evaluations were not made: 11 of 24 effects are left out"));
     }
     std::filesystem::remove(folder_ / "wait");
     for (int n = 1; n < 60; ++n) std::filesystem::remove(folder_ / fmt::format("t{}", n));
@@ -155,6 +155,7 @@ while test -e ../wait && test $n -gt 20; do sleep 0.05; done)");
 TEST_F(Morris, RefusesAndWarnsOfDesignsThatCannotServe) {
   const std::pair<const char*, const char*> refusals[] = {
       {"Levels = 5", "Error: Number of levels in Morris analysis invalid"},
+      {"Levels = 2", "Error: Number of levels in Morris analysis invalid"},
       {"Trajectories = 1", "Error: Number of trajectories in Morris analysis invalid"},
       {"Trajectories = 900000000", "Error: Number of trajectories in Morris analysis invalid"},
       {"Design = 'star'", "Design"},

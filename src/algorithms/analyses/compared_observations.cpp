@@ -42,6 +42,29 @@ std::string ComparedObservations::differenceText(std::size_t one, std::size_t ot
                      count == otherCount ? "as many, of other observations" : std::to_string(otherCount));
 }
 
+std::vector<std::string> mixedObservations(std::span<const EvaluationResult> results,
+                                           std::span<const std::string> measures) {
+  const auto isOk = [](const EvaluationResult& result) { return result.ok(); };
+  const auto first = static_cast<std::size_t>(std::ranges::find_if(results, isOk) - results.begin());
+  const ComparedObservations compared(results);
+  std::vector<std::string> texts;
+  for (std::size_t measure = 0; first < results.size() && measure < measures.size(); ++measure) {
+    std::size_t count = 0;
+    std::string difference;
+    for (std::size_t i = first + 1; i < results.size(); ++i) {
+      if (!results[i].ok() || compared.areSame(i, first, measure)) continue;
+      if (count++ == 0) difference = compared.differenceText(i, first, measure, "the first successful run");
+    }
+    if (count == 0) continue;
+    texts.push_back(fmt::format(
+        "{}: {} of {} {} judged by other observations than the first successful run ({}), and what depends on the "
+        "parameters may be which observations are used. A model that stops early should count as failed",
+        measures[measure], count, countText(static_cast<std::size_t>(std::ranges::count_if(results, isOk)), "run"),
+        count == 1 ? "is" : "are", difference));
+  }
+  return texts;
+}
+
 IncomparableOutputs ofObjectives(const IncomparableOutputs& ofMeasures, std::span<const ObjectiveFunction> objectives) {
   IncomparableOutputs found;
   for (const std::vector<std::string>& reasons : ofMeasures) {

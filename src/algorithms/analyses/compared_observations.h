@@ -29,6 +29,11 @@ class ComparedObservations final {
   std::span<const MeasurePairs> initial_;  ///< of the runs that have no pairs of their own
 };
 
+/// What should be said of measures of which some runs are judged by other observations than the first successful one,
+/// in an analysis that takes all runs together: one text for each, empty if there are none.
+std::vector<std::string> mixedObservations(std::span<const EvaluationResult> results,
+                                           std::span<const std::string> measures);
+
 /// By result and output: why the output does not compare with that of the other run of its difference; empty if it
 /// does.
 using IncomparableOutputs = std::vector<std::vector<std::string>>;

@@ -193,7 +193,8 @@ std::vector<std::string> formatGlue(const EvaluatedSample& sample, const GlueWei
 std::vector<std::string> glueWarnings(const EvaluatedSample& sample, const GlueWeights& weights, const GlueJudge& judge,
                                       const GlueSettings& settings) {
   const std::string again =
-      fmt::format("A run with Restart = 1 and another {} takes all results over and runs no model", kThresholdKeyword);
+      fmt::format("A run with Restart = 1 and another {} takes all results over and runs no model",
+                  settings.threshold ? kThresholdKeyword : kShareKeyword);
   if (!weights.best) {
     return {weights.successCount == 0
                 ? std::string("No set is behavioural, as no evaluation has succeeded")
@@ -234,13 +235,16 @@ std::vector<std::string> glueWarnings(const EvaluatedSample& sample, const GlueW
                                    countText(weights.behavioural.size(), "behavioural set"),
                                    without == 1 ? "weighs" : "weigh", without == 1 ? "its" : "their"));
   }
-  if (static_cast<double>(weighing) < kFewSets) {
+  const auto most = static_cast<double>(weighing);
+  if (most < kFewSets) {
     warnings.push_back(fmt::format(
-        "Only {}: fewer than 5 lie beyond the 5 and the 95 % quantile each, and another seed gives "
+        "Only {}{}: fewer than 5 lie beyond the 5 and the 95 % quantile each, and another seed gives "
         "others. Draw more sets (Sample_Size), or within narrower bounds where the behavioural values are; what is "
         "acceptable is no matter of their number",
-        countText(weighing, "behavioural set")));
-  } else if (weights.effective < kFewSets) {
+        countText(weighing, "behavioural set"),
+        weights.unweightedCount == 0 ? "" : (weighing == 1 ? " has a weight" : " have a weight")));
+  }
+  if (weights.effective < kFewSets && (most >= kFewSets || weights.effective < 0.7 * most)) {
     warnings.push_back(fmt::format(
         "The weights of {} behavioural sets tell as much as {:.1f} sets of equal weight: few sets make the quantiles. "
         "Draw more sets, or take a smaller Shape_Factor if the errors of neighbouring observations are not "

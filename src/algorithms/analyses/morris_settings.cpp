@@ -32,10 +32,10 @@ const SettingSection<MorrisSettings>& morrisSection() {
         checked<Settings>(
             setting<&Settings::levels>({.name = kLevelsKeyword,
                                         .defaultValue = "4",
-                                        .range = between(2, 64),
+                                        .range = between(4, 64),
                                         .refusal = "Error: Number of levels in Morris analysis invalid",
                                         .meaning = "Of `Design = 'trajectories'`: values of a parameter, an even "
-                                                   "number; a step goes over half of them."}),
+                                                   "number; a step goes over a quarter to three quarters of them."}),
             [](const Settings& s) -> std::optional<SettingRefusal> {
               if (s.levels % 2 == 0) return std::nullopt;
               return SettingRefusal{"Error: Number of levels in Morris analysis invalid", kLevelsKeyword,

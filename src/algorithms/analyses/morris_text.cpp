@@ -32,6 +32,19 @@ std::string surenessText(double certainty, int samples) {
   return fmt::format("{:.4g} %", 100.0 * certainty);
 }
 
+/// Behind "No parameter changes it": those of which that is not known.
+std::string unknownEffects(const OutputEffects& effects, std::span<const std::string> names) {
+  std::size_t count = 0;
+  std::string unknown;
+  for (std::size_t j = 0; j < effects.parameters.size(); ++j) {
+    if (effects.parameters[j].count > 0) continue;
+    if (count++ < kMostNamed) unknown += (unknown.empty() ? "" : ", ") + names[j];
+  }
+  if (count == 0) return {};
+  if (count > kMostNamed) unknown += fmt::format(" and {} more", count - kMostNamed);
+  return " as far as effects are known; there is none of " + unknown;
+}
+
 struct Texts {
   const MorrisSettings& settings;
   const AnalysisNames& names;
@@ -196,11 +209,11 @@ void appendLosses(const MorrisOutcome& outcome, const EffectPlan& plan, std::vec
   if (outcome.lostEffects == 0) return;
   std::string what;
   if (outcome.failedCount > 0) {
-    what = fmt::format("{} evaluation{} failed", outcome.failedCount, outcome.failedCount == 1 ? "" : "s");
+    what = countText(outcome.failedCount, "evaluation") + " failed";
   }
   if (outcome.missingCount > 0) {
-    what += fmt::format("{}{} {} not made", what.empty() ? "" : " and ", outcome.missingCount,
-                        outcome.missingCount == 1 ? "was" : "were");
+    what += what.empty() ? countText(outcome.missingCount, "evaluation") : fmt::format(" and {}", outcome.missingCount);
+    what += outcome.missingCount == 1 ? " was not made" : " were not made";
   }
   const char* cost = plan.design == EffectDesign::radial
                          ? "a base point costs the effects of its trajectory, any other point one"
@@ -245,7 +258,7 @@ std::vector<std::string> formatMorris(const MorrisOutcome& outcome, const Effect
     if (first.count == 0) {
       texts.lines.emplace_back("   No effect is known");
     } else if (first.muStar.value == 0.0) {
-      texts.lines.emplace_back("   No parameter changes it");
+      texts.lines.push_back("   No parameter changes it" + unknownEffects(output.effects, names.parameters));
     } else if (!first.share.hasLimits()) {
       texts.lines.push_back(
           fmt::format("   Which parameters can be fixed is not said: that takes {} effects of each", kFewestEffects));

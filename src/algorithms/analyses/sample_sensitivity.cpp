@@ -24,6 +24,12 @@ constexpr std::size_t kHarmonics = 6;
 constexpr std::size_t kMostClasses = kHarmonics + 1;
 constexpr double kNormal95 = 1.959963984540054;
 
+/// As large, to two digits.
+double twoDigits(double value) {
+  const double unit = std::pow(10.0, std::max(0.0, std::floor(std::log10(value)) - 1.0));
+  return std::ceil(value / unit) * unit;
+}
+
 using Columns = std::vector<std::vector<double>>;
 
 /// The values of a parameter in ascending order, and where equal ones end.
@@ -299,8 +305,8 @@ void appendJudgement(const OutputDependence& output, const AnalysisNames& names,
   if (widest > kWide) {
     lines.push_back(
         fmt::format("   The sample is small for this: limits are up to {:.2g} from an index; for {:g} it "
-                    "would take some {:.2g} runs",
-                    widest, kWide, static_cast<double>(output.count) * widest * widest / (kWide * kWide)));
+                    "would take some {:.0f} runs",
+                    widest, kWide, twoDigits(static_cast<double>(output.count) * widest * widest / (kWide * kWide))));
   }
 }
 

@@ -36,11 +36,11 @@ std::vector<ParameterSet> sobolSets(const SobolDesign& design, std::span<const S
                                     const ParameterDistributions& distributions, UniformGenerator& random) {
   const std::size_t p = distributions.size();
   std::vector<ParameterSet> sets(design.setCount());
-  for (std::size_t replicate = 0; replicate < kSobolReplicates && replicate < design.rows; ++replicate) {
-    const std::size_t count = (design.rows - replicate - 1) / kSobolReplicates + 1;
+  for (std::size_t replicate = 0; replicate < design.nets && replicate < design.rows; ++replicate) {
+    const std::size_t count = (design.rows - replicate - 1) / design.nets + 1;
     const UnitPoints points = owenScrambledSobol(count, 2 * p, random);
     for (std::size_t i = 0; i < count; ++i) {
-      const std::size_t row = i * kSobolReplicates + replicate;
+      const std::size_t row = i * design.nets + replicate;
       const std::span<const double> a = std::span(points[i]).first(p);
       const std::span<const double> b = std::span(points[i]).last(p);
       sets[design.ofA(row)] = distributions.setAt(a);

@@ -22,8 +22,8 @@ struct SobolFactor {
 std::string factorCountText(std::span<const SobolFactor> factors);
 
 /// The rows of a design are dealt to this many replicates, each with scramblings of its own, so that their results are
-/// independent: limits are derived from how much they differ. One net for all rows would be a little more precise, but
-/// nothing in it tells by how much (L'Ecuyer and Lemieux 2002, doi:10.1007/0-306-48102-2_20).
+/// independent: limits are derived from how much they differ. One net for all rows would be more precise, the more the
+/// larger it is, but nothing in it tells by how much (L'Ecuyer and Lemieux 2002, doi:10.1007/0-306-48102-2_20).
 inline constexpr std::size_t kSobolReplicates = 16;
 
 /// The sets of a Sobol' analysis of k factors, block by block: row i of the independent matrices A and B, of A with the
@@ -33,6 +33,7 @@ struct SobolDesign {
   std::size_t rows = 0;  ///< N, the size of the base sample
   std::size_t factors = 0;
   bool hasSecondOrder = false;
+  std::size_t nets = kSobolReplicates;  ///< scramblings; fewer of them have no limits
 
   std::size_t setsPerRow() const { return 2 + (hasSecondOrder ? 2 : 1) * factors; }
   std::size_t setCount() const { return rows * setsPerRow(); }

@@ -7,6 +7,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/compared_observations.h"
 #include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/analyses/sobol_indices.h"
 #include "algorithms/analyses/sobol_report.h"
@@ -232,6 +233,9 @@ TaskOutcome SobolTask::outcomeOf(const TaskContext& context, std::span<const Eva
   outcome.report = formatSobol(findings, fileNameOf(runFilePath(context.filePrefix, run_files::kSobol)));
   outcome.tables = sobolTables(findings);
   warnings = sobolWarnings(findings);
+  for (std::string& text : mixedObservations(results, analysisNames(context).measures)) {
+    warnings.push_back(std::move(text));
+  }
 
   std::vector<int> numbers;
   std::vector<std::size_t> sets;
@@ -276,9 +280,10 @@ TaskOutcome SobolTask::run(const TaskContext& context) {
     if (keepsSimulatedValues()) logRoomOfSimulatedValues(context, facts().resultFiles.simulatedValues, sets.size());
     results = context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
   }
-  context.log.line(fmt::format("The indices of {} are computed{}",
-                               countText(context.measures.size() + context.objectives.size(), "output"),
-                               keepsSimulatedValues() ? ", and those of the simulated series over time" : ""));
+  context.log.line(fmt::format(
+      "The indices of {} are computed{}", countText(context.measures.size() + context.objectives.size(), "output"),
+      keepsSimulatedValues() && !context.observedSeries.empty() ? ", and those of the simulated series over time"
+                                                                : ""));
   std::vector<std::string> warnings;
   TaskOutcome outcome = outcomeOf(context, results, warnings);
   logReport(context, outcome.report);

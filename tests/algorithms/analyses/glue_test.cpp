@@ -154,6 +154,11 @@ TEST(GlueWeights, SayWhyThereAreNone) {
               ElementsAre(StartsWith("The likelihood of all 2 behavioural sets is 0")));
   EXPECT_THAT(warningsOf(sampleOf({0.3, 0.5}), {.threshold = 0.1}),
               ElementsAre(StartsWith("Only 2 behavioural sets: "), StartsWith("Every evaluation is behavioural: ")));
+  EXPECT_THAT(warningsOf(sampleOf({-0.3, 0.1, 0.99}),
+                         {.share = 1.0, .likelihood = LikelihoodShape::efficiency, .shapeFactor = 9.0}),
+              ElementsAre(StartsWith("1 of 3 behavioural sets weighs nothing, as its"),
+                          StartsWith("Only 2 behavioural sets have a weight: "),
+                          StartsWith("The weights of 2 behavioural sets tell as much as 1.0 sets")));
   std::vector<double> many(300, 0.5);
   many[7] = 0.9999;
   EXPECT_THAT(warningsOf(sampleOf(many), {.share = 1.0, .shapeFactor = 2.0}),
