@@ -6,7 +6,7 @@
 #include <gmock/gmock.h>
 
 #include "common/data_table.h"
-#include "integration/model_folder.h"
+#include "integration/dream_folder.h"
 
 namespace mirevo::testing {
 namespace {
@@ -14,28 +14,6 @@ namespace {
 using ::testing::AllOf;
 using ::testing::HasSubstr;
 using ::testing::Not;
-
-/// A setup with chains for a, b (c is fixed). `dream`: further lines of the section DREAM.
-std::string writeDream(const ModelFolder& folder, RunSettings settings, const std::string& dream) {
-  settings.option = 3;
-  folder.writeSetup(settings);
-  std::string text = folder.read("basin.kdx");
-  const auto begin = text.find("Uncertainty_Type = 1");
-  text.replace(begin, 20, "Uncertainty_Type = 'DREAM'");
-  const auto first = text.find("[PARAMETER_1]", begin);
-  const auto last = text.find("[/UNCERTAINTY_ESTIMATION]", first);
-  text.replace(first, last - first, "[DREAM]\n" + dream + "\n    [/DREAM]\n  ");
-  return folder.write("basin.kdx", text);
-}
-
-double cell(const std::string& table, const std::string& name, const std::string& column) {
-  const ReadTable read = readDataTable(table);
-  for (const auto& row : read.rows) {
-    if (row[0] == name) return realCell(row[*read.column(column)]).value();
-  }
-  ADD_FAILURE() << "no row " << name << " in\n" << table;
-  return std::nan("");
-}
 
 /// The standard deviations of a and b of a + b sin(t / 58), t = 0 ... 364, for errors of standard deviation 1.
 struct Expected {
@@ -68,11 +46,11 @@ TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedForm) {
   const Expected expected = linearModel();
   for (const auto& [name, mean, deviation] :
        {std::tuple{"a", 5.0, 3.0 * expected.a}, std::tuple{"b", 2.0, 3.0 * expected.b}}) {
-    const double error = 4.0 * deviation / std::sqrt(cell(posterior, name, "Effective size"));
-    EXPECT_NEAR(cell(posterior, name, "Mean"), mean, error);
-    EXPECT_NEAR(cell(posterior, name, "Standard deviation"), deviation, error);
+    const double error = 4.0 * deviation / std::sqrt(dreamCell(posterior, name, "Effective size"));
+    EXPECT_NEAR(dreamCell(posterior, name, "Mean"), mean, error);
+    EXPECT_NEAR(dreamCell(posterior, name, "Standard deviation"), deviation, error);
   }
-  EXPECT_NEAR(cell(folder.read("basin_SampleCorrelation.dat"), "a", "b"), expected.correlation, 0.4);
+  EXPECT_NEAR(dreamCell(folder.read("basin_SampleCorrelation.dat"), "a", "b"), expected.correlation, 0.4);
   // The rows of the chains: natural logarithm of the normal density of 365 errors, at the states' own evaluations.
   const ReadTable table = readDataTable(chains);
   const ReadTable results = readDataTable(folder.read("basin.dat"));
@@ -271,8 +249,8 @@ TEST(Dream, PriorsThatHaveNothingWithinTheBoundsAreRefusedAndOthersAreCutThere) 
   const ProgramResult cut = runProgram({withPrior("5.0", "100.0")});
   ASSERT_EQ(cut.exitCode, 0) << cut.error;
   const std::string posterior = folder.read("basin_Posterior.dat");
-  EXPECT_NEAR(cell(posterior, "a", "Prior 5 %"), 0.5, 0.1);  // of one that is nearly flat from 0 to 10
-  EXPECT_NEAR(cell(posterior, "a", "Prior 95 %"), 9.5, 0.1);
+  EXPECT_NEAR(dreamCell(posterior, "a", "Prior 5 %"), 0.5, 0.1);  // of one that is nearly flat from 0 to 10
+  EXPECT_NEAR(dreamCell(posterior, "a", "Prior 95 %"), 9.5, 0.1);
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("PARAMETER_1: a, mean 5, standard deviation 100"));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("% of the values drawn are outside"));
 

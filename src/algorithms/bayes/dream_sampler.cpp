@@ -21,7 +21,7 @@ constexpr double kJumpNoise = 1e-6;                 // standard deviation of zet
 constexpr std::array kAdaptations{0.5, 0.75, 1.0};  // of burn-in
 constexpr std::size_t kFirstCheck = 50;             // generations behind burn-in
 constexpr double kCheckGrowth = 1.3;
-constexpr double kLeastValues = 2000.0;  // of a chain, that a check looks at if there are so many
+constexpr double kLeastValues = 1000.0;  // of a chain, that a check looks at if there are so many
 constexpr double kValuesPerDraw = 4.0;   // all chains together, for each independent draw that is wanted
 constexpr int kMostDraws = 100000;       // for one prior draw that is allowed
 
@@ -114,8 +114,9 @@ std::vector<double> DreamSampler::drawAllowed() {
              "none of 100000 draws lies within the bounds and meets the constraints");
 }
 
-void DreamSampler::addToArchive(std::span<const double> point) {
-  archive_.emplace_back(point.begin(), point.end());
+void DreamSampler::addToArchive(ArchiveMember member) {
+  archive_.push_back(std::move(member));
+  const std::vector<double>& point = archive_.back().point;
   const auto count = static_cast<double>(archive_.size());
   for (std::size_t j = 0; j < point.size(); ++j) {
     const double change = point[j] - archiveMeans_[j];
@@ -125,7 +126,8 @@ void DreamSampler::addToArchive(std::span<const double> point) {
 }
 
 std::size_t DreamSampler::leastArchive() const {
-  const std::size_t ofJumps = 2 * static_cast<std::size_t>(settings_.pairCount) + 3;
+  // A third of it may be states of the chain itself, of three chains.
+  const std::size_t ofJumps = 3 * static_cast<std::size_t>(settings_.pairCount) + 3;
   const std::size_t wanted =
       settings_.archiveStart > 0 ? static_cast<std::size_t>(settings_.archiveStart) : 10 * dimension();
   return std::max(wanted, ofJumps);
@@ -135,15 +137,15 @@ std::size_t DreamSampler::leastArchive() const {
 void DreamSampler::forgetOldestArchive() {
   const std::size_t kept = std::max(archive_.size() - archive_.size() / 2, leastArchive());
   if (kept >= archive_.size()) return;
-  std::vector<std::vector<double>> all = std::exchange(archive_, {});
+  std::vector<ArchiveMember> all = std::exchange(archive_, {});
   archiveMeans_.assign(dimension(), 0.0);
   archiveSquares_.assign(dimension(), 0.0);
-  for (std::size_t k = all.size() - kept; k < all.size(); ++k) addToArchive(all[k]);
+  for (std::size_t k = all.size() - kept; k < all.size(); ++k) addToArchive(std::move(all[k]));
 }
 
 void DreamSampler::initialise() {
   const std::size_t chains = history_.chainCount();
-  while (archive_.size() < leastArchive()) addToArchive(drawAllowed());
+  while (archive_.size() < leastArchive()) addToArchive({drawAllowed(), std::nullopt});
   std::vector<DreamProposal> proposals;
   for (std::size_t c = 0; c < chains; ++c) proposals.push_back({drawAllowed(), 0});
   const std::vector<ProposalResult> results = problem_.evaluate(proposals);
@@ -155,10 +157,12 @@ void DreamSampler::initialise() {
   }
 }
 
-std::vector<std::size_t> DreamSampler::pickArchive(std::size_t count) {
+/// Members of the archive that were no states of this chain.
+std::vector<std::size_t> DreamSampler::pickArchive(std::size_t count, std::size_t chain) {
   std::vector<std::size_t> picked;
   while (picked.size() < count) {
     const std::size_t index = random_.below(archive_.size());
+    if (archive_[index].chain == chain) continue;
     if (std::ranges::find(picked, index) == picked.end()) picked.push_back(index);
   }
   return picked;
@@ -181,7 +185,7 @@ std::vector<std::size_t> DreamSampler::pickDimensions(std::size_t& crossover) {
   return changed;
 }
 
-void DreamSampler::proposeParallel(std::span<const double> state, Candidate& candidate) {
+void DreamSampler::proposeParallel(std::size_t chain, Candidate& candidate) {
   std::vector<std::size_t> changed(dimension());
   std::iota(changed.begin(), changed.end(), std::size_t{0});
   std::size_t pairs = 1;
@@ -192,12 +196,14 @@ void DreamSampler::proposeParallel(std::span<const double> state, Candidate& can
     gamma = (1.0 + random_.uniform(-kJumpSpread, kJumpSpread)) * 2.38 /
             std::sqrt(2.0 * static_cast<double>(pairs * changed.size()));
   }
-  const std::vector<std::size_t> picked = pickArchive(2 * pairs);
+  const std::vector<std::size_t> picked = pickArchive(2 * pairs, chain);
   std::vector<double>& point = candidate.proposal.point;
-  point.assign(state.begin(), state.end());
+  point = currentPoints_[chain];
   for (const std::size_t j : changed) {
     double difference = 0.0;
-    for (std::size_t k = 0; k < pairs; ++k) difference += archive_[picked[2 * k]][j] - archive_[picked[2 * k + 1]][j];
+    for (std::size_t k = 0; k < pairs; ++k) {
+      difference += archive_[picked[2 * k]].point[j] - archive_[picked[2 * k + 1]].point[j];
+    }
     const double noise = kJumpNoise * (problem_.upper[j] - problem_.lower[j]) * random_.normal();
     point[j] += gamma * difference + noise;
     if (settings_.boundary == BoundaryHandling::fold) point[j] = folded(point[j], problem_.lower[j], problem_.upper[j]);
@@ -206,22 +212,23 @@ void DreamSampler::proposeParallel(std::span<const double> state, Candidate& can
 
 /// Along the line through the state x and an archive member z: x + g (P(a) - P(b)) with the projections of two others.
 /// The density along the line changes with the distance from z to the power d - 1, which the factor corrects.
-void DreamSampler::proposeSnooker(std::span<const double> state, Candidate& candidate) {
-  const std::vector<std::size_t> picked = pickArchive(3);
+void DreamSampler::proposeSnooker(std::size_t chain, Candidate& candidate) {
+  const std::vector<double>& state = currentPoints_[chain];
+  const std::vector<std::size_t> picked = pickArchive(3, chain);
   const double gamma = random_.uniform(1.2, 2.2);
-  const std::vector<double>& centre = archive_[picked[0]];
+  const std::vector<double>& centre = archive_[picked[0]].point;
   std::vector<double>& point = candidate.proposal.point;
-  point.assign(state.begin(), state.end());
+  point = state;
   double squares = 0.0;
   double projection = 0.0;
   const auto scaled = [&](std::size_t j, double value) { return value / (problem_.upper[j] - problem_.lower[j]); };
   for (std::size_t j = 0; j < point.size(); ++j) {
     const double axis = scaled(j, state[j] - centre[j]);
     squares += axis * axis;
-    projection += axis * scaled(j, archive_[picked[1]][j] - archive_[picked[2]][j]);
+    projection += axis * scaled(j, archive_[picked[1]].point[j] - archive_[picked[2]].point[j]);
   }
   if (!(squares > 0.0) || projection == 0.0) {
-    // The state is a member of the archive, or the two others are equal: the way has no direction or no length.
+    // The state is that of the member, or the two others are equal: the way has no direction or no length.
     candidate.logFactor = -kInfinity;
     return;
   }
@@ -239,9 +246,9 @@ DreamSampler::Candidate DreamSampler::propose(std::size_t chain) {
   const std::span<const double> state = currentPoints_[chain];
   candidate.isSnooker = random_.uniform() < settings_.snookerShare;
   if (candidate.isSnooker) {
-    proposeSnooker(state, candidate);
+    proposeSnooker(chain, candidate);
   } else {
-    proposeParallel(state, candidate);
+    proposeParallel(chain, candidate);
   }
   const std::vector<double>& point = candidate.proposal.point;
   const bool isPossible = candidate.logFactor > -kInfinity && isInside(point);
@@ -365,7 +372,7 @@ void DreamSampler::endGeneration() {
   }
   const std::size_t generation = history_.generations();
   if (generation % static_cast<std::size_t>(settings_.archiveInterval) == 0) {
-    for (const std::vector<double>& point : currentPoints_) addToArchive(point);
+    for (std::size_t c = 0; c < currentPoints_.size(); ++c) addToArchive({currentPoints_[c], c});
     if (!burnIn_) adaptCrossover();
   }
   const double burnInRuns = settings_.burnInRuns();
@@ -408,8 +415,8 @@ std::optional<ConvergenceCheck> DreamSampler::checkNow() const {
   const std::size_t stride = (history_.generations() - *burnIn_ + values - 1) / values;
   for (std::size_t j = 0; j < dimension(); ++j) {
     const auto columns = history_.columns(j, *burnIn_, stride);
-    check.rHat.push_back(splitRHat(columns));
-    check.effectiveSizes.push_back(effectiveSampleSize(columns));
+    check.rHat.push_back(mirevo::largestRHat(columns));
+    check.effectiveSizes.push_back(leastEffectiveSampleSize(columns));
   }
   return check;
 }

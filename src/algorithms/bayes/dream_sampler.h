@@ -29,8 +29,8 @@ struct DreamSettings {
   std::int32_t archiveInterval = 10;  ///< generations between additions to the archive (K)
   std::int32_t archiveStart = 0;      ///< prior draws in the archive (m_0); 0: ten per dimension
   BoundaryHandling boundary = BoundaryHandling::fold;
-  double rHatLimit = 1.05;       ///< the run may end when split R-hat of every dimension is at most this ...
-  double effectiveSize = 400.0;  ///< ... and its effective sample size at least this
+  double rHatLimit = 1.05;       ///< the run may end when largestRHat() of every dimension is at most this ...
+  double effectiveSize = 400.0;  ///< ... and its leastEffectiveSampleSize() at least this
 
   double burnInRuns() const { return burnInShare * (burnInOf > 0 ? burnInOf : mostRuns); }
 };
@@ -98,8 +98,8 @@ class ChainHistory final {
 struct ConvergenceCheck {
   std::size_t generations = 0;
   int runs = 0;                        ///< model runs so far
-  std::vector<double> rHat;            ///< one per dimension
-  std::vector<double> effectiveSizes;  ///< one per dimension
+  std::vector<double> rHat;            ///< largestRHat(), one per dimension
+  std::vector<double> effectiveSizes;  ///< leastEffectiveSampleSize(), one per dimension
 
   double largestRHat() const;         ///< infinite if one is not a number
   double leastEffectiveSize() const;  ///< 0 if one is not a number
@@ -127,6 +127,10 @@ enum class DreamEnd { none, converged, budget, generations };
 ///   lower quartile of the mean log-densities, too: a chain on its way to another peak is none.
 /// - At the same three times the older half of the archive is forgotten, as far as more than its first size is left;
 ///   behind burn-in nothing is.
+/// - A chain jumps by members of the archive that were not its own states. A chain that stays long in a tail puts many
+///   copies of its state into the archive, and a difference from one of them to the bulk of the posterior leads back
+///   there more often than chains of the bulk come out. With its own states in the archive the tails are sampled too
+///   rarely.
 /// - The stretch 1 + lambda is one number for all dimensions of a jump: one for each leads off a narrow ridge.
 /// - A jump from peak to peak (gamma = 1) is by one pair of archive members, in all dimensions and without a stretch:
 ///   it has to meet the other peak.
@@ -161,20 +165,24 @@ class DreamSampler final {
     std::optional<std::size_t> crossover;  ///< index of its value; empty where it changes all dimensions anyway
     double uniform = 0.0;                  ///< with which its acceptance is decided
   };
+  struct ArchiveMember {
+    std::vector<double> point;
+    std::optional<std::size_t> chain;  ///< whose state it was; empty: a draw from the prior
+  };
 
   std::size_t dimension() const { return problem_.lower.size(); }
   std::vector<double> drawAllowed();
   void initialise();
   Candidate propose(std::size_t chain);
   std::vector<std::size_t> pickDimensions(std::size_t& crossover);
-  void proposeParallel(std::span<const double> state, Candidate& candidate);
-  void proposeSnooker(std::span<const double> state, Candidate& candidate);
-  std::vector<std::size_t> pickArchive(std::size_t count);
+  void proposeParallel(std::size_t chain, Candidate& candidate);
+  void proposeSnooker(std::size_t chain, Candidate& candidate);
+  std::vector<std::size_t> pickArchive(std::size_t count, std::size_t chain);
   bool isInside(std::span<const double> point) const;
   bool isSameModel(std::span<const double> a, std::span<const double> b) const;
   void decide(std::size_t chain, const Candidate& candidate, const ProposalResult& result);
   void noteJump(std::span<const double> from, std::span<const double> to, std::size_t crossover);
-  void addToArchive(std::span<const double> point);
+  void addToArchive(ArchiveMember member);
   std::size_t leastArchive() const;
   void forgetOldestArchive();
   void adaptCrossover();
@@ -190,9 +198,9 @@ class DreamSampler final {
   std::optional<std::size_t> burnIn_;
   std::size_t nextCheck_ = 0;  ///< generations
   std::vector<ConvergenceCheck> checks_;
-  std::vector<std::vector<double>> archive_;  ///< Z
-  std::vector<double> archiveMeans_;          ///< of Z, one per dimension
-  std::vector<double> archiveSquares_;        ///< sums of squared deviations from them
+  std::vector<ArchiveMember> archive_;  ///< Z
+  std::vector<double> archiveMeans_;    ///< of Z, one per dimension
+  std::vector<double> archiveSquares_;  ///< sums of squared deviations from them
   std::vector<double> crossoverProbabilities_;
   std::vector<double> crossoverDistances_;  ///< standardised squared jumps, one per crossover value
   std::vector<double> crossoverUses_;

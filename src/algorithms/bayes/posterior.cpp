@@ -255,7 +255,7 @@ DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dim
 
 DataTable convergenceTable(const DreamSampler& sampler, const ShownDimensions& dimensions) {
   DataTable table{run_files::kConvergence,
-                  {"Split R-hat and effective sample sizes behind burn-in"},
+                  {"R-hat and effective sample sizes behind burn-in"},
                   {"Generation", "Evaluations", "Name", "R-hat", "Effective size"},
                   {}};
   std::vector<ConvergenceCheck> checks = sampler.checks();

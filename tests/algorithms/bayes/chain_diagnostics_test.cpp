@@ -48,13 +48,41 @@ TEST(ChainDiagnostics, RHatIsOfTheVariancesAmongAndWithinHalves) {
   EXPECT_GT(splitRHat(rising), 1.05);
 }
 
+TEST(ChainDiagnostics, ChainsThatDifferInWidthOrRarelyReachTheirTailsAreFound) {
+  const std::vector<double> means(4, 0.0);
+  const auto alike = processes(0.5, means, 10'000);
+  EXPECT_LT(largestRHat(alike), 1.003);
+  EXPECT_NEAR(leastEffectiveSampleSize(alike), 13'333.0, 1'500.0);
+  // One chain goes only half as far as the others, about the same mean.
+  auto narrow = alike;
+  for (double& value : narrow[2]) value *= 0.5;
+  EXPECT_LT(splitRHat(narrow), 1.003);
+  EXPECT_GT(largestRHat(narrow), 1.05);
+  // A single value far off makes a variance that hides how the chains differ; their ranks do not.
+  auto shifted = alike;
+  for (double& value : shifted[0]) value += 0.5;
+  shifted[1][5'000] = 1e6;
+  EXPECT_LT(splitRHat(shifted), 1.003);
+  EXPECT_GT(largestRHat(shifted), 1.01);
+  // Alternating signs: means are known well, but half of each chain is in the tail.
+  auto slow = processes(-0.9, means, 10'000);
+  for (auto& chain : slow) {
+    for (std::size_t t = 0; t < chain.size(); ++t) chain[t] *= t % 2'000 < 1'500 ? 1.0 : 10.0;
+  }
+  EXPECT_GT(effectiveSampleSize(slow), 40'000.0);
+  EXPECT_LT(leastEffectiveSampleSize(slow), 1'000.0);
+}
+
 TEST(ChainDiagnostics, ChainsThatStandStillHaveNone) {
   const std::vector<std::vector<double>> still{{1.0, 1.0, 1.0, 1.0}, {1.0, 1.0, 1.0, 1.0}};
   EXPECT_TRUE(std::isnan(splitRHat(still)));
   EXPECT_TRUE(std::isnan(effectiveSampleSize(still)));
+  EXPECT_TRUE(std::isnan(largestRHat(still)));
+  EXPECT_TRUE(std::isnan(leastEffectiveSampleSize(still)));
   EXPECT_TRUE(std::isnan(splitRHat(std::vector<std::vector<double>>{{1.0, 2.0, 3.0}})));
   const std::vector<std::vector<double>> apart{{1.0, 1.0, 1.0, 1.0}, {2.0, 2.0, 2.0, 2.0}};
   EXPECT_TRUE(std::isinf(splitRHat(apart)));
+  EXPECT_TRUE(std::isinf(largestRHat(apart)));  // though all are equally far from the median
 }
 
 }  // namespace

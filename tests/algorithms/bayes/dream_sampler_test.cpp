@@ -93,6 +93,39 @@ TEST(DreamSampler, EachKindOfUpdateByItselfKeepsTheTarget) {
   }
 }
 
+TEST(DreamSampler, ChainsThatBeginInTheirTargetStayInIt) {
+  // Chains and archive are exact draws of a twisted normal of two dimensions, and 300 generations later the states must
+  // be no less far out: a chain must not find the way back from a tail more easily than others find the way there.
+  constexpr int kRepetitions = 250;
+  for (const double snookers : {0.0, 0.1, 0.9}) {
+    SCOPED_TRACE(snookers);
+    double squares = 0.0;
+    double bent = 0.0;
+    double count = 0.0;
+    for (int k = 1; k <= kRepetitions; ++k) {
+      ChainRandom random(k, 1);
+      DreamProblem problem = sampledFunction(times(2, -300.0), times(2, 300.0), testing::lnTwisted);
+      problem.drawPrior = [&random](auto) {
+        const double x = 10.0 * random.normal();
+        return std::vector<double>{x, 10.0 - 0.1 * x * x + random.normal()};
+      };
+      DreamSettings settings = untilBudget(1'000'000);
+      settings.burnInShare = 0.9;  // which is not reached: states alone move
+      settings.snookerShare = snookers;
+      DreamSampler sampler(settings, std::move(problem), k);
+      for (int g = 0; g < 300; ++g) sampler.advance();
+      for (std::size_t c = 0; c < 4; ++c) {
+        const auto last = sampler.history().at(299, c).point;
+        squares += last[0] * last[0] / 100.0;
+        bent += last[1] / std::sqrt(201.0);
+        ++count;
+      }
+    }
+    EXPECT_NEAR(squares / count, 1.0, 4.0 * std::sqrt(2.0 / count));  // a chi-square has the variance 2
+    EXPECT_NEAR(bent / count, 0.0, 4.0 / std::sqrt(count));
+  }
+}
+
 TEST(DreamSampler, BoundsAreKeptWithoutLoss) {
   // exp(3 x) on [0, 1], highest at a bound.
   const double e = std::exp(3.0);
@@ -376,7 +409,7 @@ TEST(DreamSampler, AnEstimatedErrorHasItsOwnPosteriorWithoutFurtherRuns) {
   for (const double value : logarithms) precision += std::exp(-2.0 * value) / static_cast<double>(logarithms.size());
   EXPECT_NEAR(precision * n * sample.deviation * sample.deviation, n - 1.0, 0.5);
   const double states = static_cast<double>(sampler.history().generations()) * 4.0;
-  EXPECT_GT(states, 1.1 * sampler.runs());
+  EXPECT_GT(states, 1.05 * sampler.runs());
 }
 
 }  // namespace

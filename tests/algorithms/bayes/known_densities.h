@@ -53,7 +53,7 @@ struct KnownDensity {
 };
 
 inline std::span<const KnownDensity> knownDensities() {
-  static const KnownDensity all[] = {{"two-peaks", 10, 20.0, 5, lnTwoPeaks, [](std::size_t) { return 5.0 / 3.0; },
+  static const KnownDensity all[] = {{"two-peaks", 10, 20.0, 10, lnTwoPeaks, [](std::size_t) { return 5.0 / 3.0; },
                                       [](std::size_t) { return std::sqrt(26.0 - 25.0 / 9.0); }},
                                      {"twisted", 10, 300.0, 4, lnTwisted, [](std::size_t) { return 0.0; },
                                       [](std::size_t j) { return j == 0   ? 10.0

@@ -9,6 +9,7 @@
 
 #include <gtest/gtest.h>
 
+#include "algorithms/bayes/chain_diagnostics.h"
 #include "algorithms/bayes/dream_sampler.h"
 
 namespace mirevo {
@@ -80,7 +81,9 @@ inline Moments momentsOf(std::span<const double> values) {
 /// kurtosis is at least that of the target: the standard error of a deviation grows with it.
 inline void expectMoments(const DreamSampler& sampler, std::size_t dimension, double mean, double deviation,
                           double kurtosis = 5.0) {
-  const double size = sampler.checkNow()->effectiveSizes[dimension];
+  const std::size_t burnIn = sampler.burnIn().value();
+  const std::size_t stride = (sampler.history().generations() - burnIn) / 1000 + 1;
+  const double size = leastEffectiveSampleSize(sampler.history().columns(dimension, burnIn, stride));
   const Moments found = momentsOf(posteriorOf(sampler, dimension));
   EXPECT_GT(size, 50.0) << dimension;
   EXPECT_NEAR(found.mean, mean, 4.0 * deviation / std::sqrt(size)) << dimension;
