@@ -33,12 +33,15 @@ bool isFrontTable(const ReadTable& table, std::size_t valueCount) {
          std::equal(kColumns.begin(), kColumns.end(), table.columns.begin());
 }
 
-/// False if the row does not say which set it is, how good, or with which parameters.
+/// False if the row does not say which set it is, with which parameters, or, of a set on the front, how good.
 bool addRow(const std::vector<std::string>& cells, ReportedFront& front) {
   const auto number = parseInteger(cells[kEvaluation]);
   const auto rank = parseInteger(cells[kRank]);
   const auto isNumber = [](const std::string& cell) { return std::isfinite(numberIn(cell)); };
-  if (!number || !rank || *rank < 1 || !std::all_of(cells.begin() + kFirstValue, cells.end(), isNumber)) return false;
+  // A set that violates a constraint is not run: its objectives are not known.
+  const std::size_t firstNumber = kFirstValue + (rank == 1 ? 0 : front.values.size());
+  const auto first = cells.begin() + static_cast<std::ptrdiff_t>(firstNumber);
+  if (!number || !rank || *rank < 1 || !std::all_of(first, cells.end(), isNumber)) return false;
   if (numberIn(cells[kSuggested]) == 1.0 && !front.suggested) front.suggested = front.numbers.size();
   front.numbers.push_back(*number);
   front.ranks.push_back(*rank);
@@ -121,12 +124,8 @@ std::vector<ScenarioSeries> reportedFrontSeries(const std::string& filePrefix, c
                                                 const std::vector<std::string>& names,
                                                 const std::vector<std::string>& shown, std::string& fault) {
   const std::string path = runFilePath(filePrefix, run_files::kParetoSeries);
-  std::string reason;
-  const auto text = readTextFile(path, reason);
-  if (!text) {
-    fault = fmt::format("The hydrographs of the front are not shown: {}: {}", fileNameOf(path), reason);
-    return {};
-  }
+  const auto text = readFileIfThere(path);
+  if (!text) return {};
   std::vector<ScenarioSeries> kept;
   for (ScenarioSeries& one : readScenarioSeries(*text)) {
     const auto name = std::find(names.begin(), names.end(), one.measure);

@@ -39,7 +39,7 @@ std::optional<ReportedFront> reportedFront(const std::string& filePrefix, std::s
                                            std::size_t parameterCount, std::vector<std::string>& faults);
 
 /// The simulated series of the sets of a front; `names` are those of the pairs of series in the file, `shown` those in
-/// the report. A file that is not there or damaged gives none, with the reason in `fault`.
+/// the report. None if the search kept none, or if the file is damaged, with the reason in `fault`.
 std::vector<ScenarioSeries> reportedFrontSeries(const std::string& filePrefix, const ReportedFront& front,
                                                 const std::vector<std::string>& names,
                                                 const std::vector<std::string>& shown, std::string& fault);

@@ -3,7 +3,7 @@ import { chart, type Chart, type ChartPlan } from '../chart';
 import type { Front, ReportData } from '../data';
 import { make, shorten, table } from '../dom';
 import { count, counted, number, percent } from '../format';
-import { spaced } from '../numbers';
+import { finite, spaced } from '../numbers';
 import { frontMatrixPlan, frontPlan, hypervolumePlan, objectiveLinesPlan, parameterLinesPlan } from './front_charts';
 import { Picking } from './front_picking';
 import { above, leastOf, pickedPoint } from './front_point';
@@ -129,15 +129,14 @@ export function frontSection(data: ReportData): Section | null {
   const several = front.objectives.length > 1 && places.length > 1;
   const content: Node[] = [findingList([...violated(front, places), ...costs(front, places, ends), ...growth(front)])];
   if (several) {
-    content.push(heading('What one objective costs the other'), endsTable(front, picking, ends),
-      make('p', { class: 'note' }, 'In brackets: how far above the best value of the front. A number of an evaluation shows its point below.'),
+    content.push(heading('What one objective costs the other'), paragraph('In brackets: how far above the best value of the front. The number of an evaluation shows its point below.'), endsTable(front, picking, ends),
       drawn(front.objectives.length === 2 ? frontPlan(front, picking) : frontMatrixPlan(front, picking)), pointTable(front, picking));
   }
   content.push(...pickedPoint(data, front, picking));
   if (several) {
     content.push(heading('Along the front'), ...(front.objectives.length > 3 ? [drawn(objectiveLinesPlan(front, picking))] : []), drawn(parameterLinesPlan(data, front, picking)));
   }
-  if (front.course && front.course.evaluations.length > 1) content.push(heading('How the front grew'), chart(hypervolumePlan(front.course)));
+  if (front.course && finite(front.course.hypervolumes).length > 1) content.push(heading('How the front grew'), chart(hypervolumePlan(front.course)));
   if (front.objectives.length < 2) content.unshift(paragraph('There is one objective alone: a front needs two.'));
   return { id: 'front', title: 'The trade-off between the objectives', content };
 }

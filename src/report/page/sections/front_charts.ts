@@ -5,7 +5,7 @@ import { shorten } from '../dom';
 import { count, number } from '../format';
 import type { Look } from '../look';
 import type { Values } from '../figure_files';
-import { spaced } from '../numbers';
+import { finite, spaced } from '../numbers';
 import type { Picking } from './front_picking';
 import { parallelPlan, parameterAxis, thickLines, type ParallelAxis, type ParallelLines } from './parallel';
 
@@ -42,7 +42,7 @@ function setTip(front: Front, place: number): HTMLElement {
 /** Dots of the sets in one cell; `index`: of its axes. */
 function dots(front: Front, picking: Picking, cell: Cell, index: number, look: Look, showsOthers: boolean): object[] {
   const own = { type: 'scatter', xAxisIndex: index, yAxisIndex: index, clip: true };
-  const others = front.ranks.flatMap((rank, place) => (rank === 1 ? [] : [place]));
+  const others = front.ranks.flatMap((rank, place) => (rank === 1 || front.values[cell.x]?.[place] == null || front.values[cell.y]?.[place] == null ? [] : [place]));
   const some = (places: number[]) => spaced(places.length, kDotsDrawn).map((at) => dotOf(front, cell, places[at]!));
   return [
     ...(showsOthers && others.length > 0 ? [{ ...own, name: 'other sets', data: some(others), symbolSize: 4, itemStyle: { color: look.dots, opacity: 0.4 } }] : []),
@@ -71,18 +71,27 @@ const legendOf = (front: Front, look: Look) => legend(look, {
 });
 
 const kHowToPick = 'Click a point of the front, or press the left and right arrow keys in the chart, to see its parameters and hydrographs below.';
-const kOthers = { key: 'others', label: 'Other sets', on: true, hint: 'The rest of the last population, which sets of the front dominate' };
+const kFarOff = 3; // times the extent of the front
+
+/** Whether the other sets can be drawn without pressing the front together. */
+const areNear = (front: Front, picking: Picking) => front.values.every((column) => {
+  const extent = (values: Maybe[]) => finite(values).reduce(([low, high], value) => [Math.min(low, value), Math.max(high, value)] as [number, number], [Infinity, -Infinity] as [number, number]);
+  const [[low, high], [least, most]] = [extent(picking.places.map((place) => column[place] ?? null)), extent(column)];
+  return most - least <= kFarOff * (high - low);
+});
+
+const othersSwitch = (front: Front, picking: Picking) => (front.ranks.some((rank) => rank > 1)
+  ? [{ key: 'others', label: 'Other sets', on: areNear(front, picking), hint: 'The rest of the last population, which sets of the front dominate' }] : []);
 
 /** Two objectives, one against the other. */
 export function frontPlan(front: Front, picking: Picking): ChartPlan {
   const cell = { x: 0, y: 1 };
-  const hasOthers = front.ranks.some((rank) => rank > 1);
   return {
     title: `The front: ${front.objectives[1]} against ${front.objectives[0]}`,
     note: `Of no point of the front is there a set that is better in one objective and not worse in the other. ${kHowToPick}`,
     height: 420,
     zoom: 'xy',
-    switches: hasOthers ? [kOthers] : [],
+    switches: othersSwitch(front, picking),
     option: (look, is) => ({
       legend: legendOf(front, look),
       grid: { left: 26, right: 24, top: 40, bottom: 30 },
@@ -107,7 +116,7 @@ export function frontMatrixPlan(front: Front, picking: Picking): ChartPlan {
     note: `${shown < front.objectives.length ? `The first ${shown} of ${front.objectives.length} objectives. ` : ''}Of no point of the front is there a set that is better in one objective and worse in none. ${kHowToPick}`,
     height,
     fitsWidth: true,
-    switches: front.ranks.some((rank) => rank > 1) ? [kOthers] : [],
+    switches: othersSwitch(front, picking),
     option: (look, is, width = kFileWidth) => {
       const across = (width - kRoom.left - kRoom.right - (size - 1) * kGap) / size;
       const down = (height - kRoom.top - kRoom.bottom - (size - 1) * kGap) / size;
@@ -174,7 +183,7 @@ export function hypervolumePlan(course: NonNullable<Front['course']>): ChartPlan
   const { evaluations, sizes, hypervolumes } = course;
   return {
     title: 'Hypervolume of the front over the evaluations',
-    note: 'What the front dominates, up to a point behind its worst values: it grows as the front comes nearer to the best and spreads. Where it stays level, more evaluations bring little.',
+    note: 'The share of the space between the ideal point and a reference point behind the front that the front dominates. It grows as the front comes nearer to the best values and spreads; where it stays level, more evaluations bring little.',
     height: 280,
     zoom: 'xy',
     option: (look) => ({

@@ -54,8 +54,9 @@ function findings(data: ReportData, repetitions: Repetitions): Finding[] {
     { kind: isAgreed ? 'good' : 'warning', text: `${count(near.length)} of ${counted(all.length, 'repetition')} ended within ${percent(kNear)} of the least value.${
       isAgreed ? '' : all.length > 1 ? ' What the search finds depends on the seed: a larger budget helps, or taking the best of several repetitions, as here.' : ''}` },
   ];
-  const unfinished = all.length - values.length;
-  if (unfinished > 0) found.push({ kind: 'warning', text: `${counted(unfinished, 'repetition')} found no value: all of their model runs failed.` });
+  const [without, unfinished] = [all.length - values.length, all.filter(({ termination }) => termination === '').length];
+  if (without > 0) found.push({ kind: 'warning', text: `${counted(without, 'repetition')} found no value.` });
+  if (unfinished > 0) found.push({ kind: 'warning', text: `${counted(unfinished, 'repetition')} had not ended.` });
   if (near.length < 2) return found;
   const apart = spreads(data, repetitions, near).filter(({ share }) => share > kApart);
   const text = (spread: Spread) => `${isolated(spread.name)} (${number(spread.low)} to ${number(spread.high)}, ${percent(spread.share, 2)} of its range)`;
@@ -107,7 +108,7 @@ function coursePlan(courses: Course[]): ChartPlan {
       legend: legend(look, { data: lineEntries(shown.map(({ one }) => nameOf(one))), itemWidth: 34 }),
       grid: { left: 24, right: 16, top: 36, bottom: 28 },
       xAxis: axis(look, { name: 'Evaluation of the repetition', min: 1, max: longest, minInterval: 1, nameGap: 26 }),
-      yAxis: axis(look, { log: is('log') }),
+      yAxis: axis(look, is('log') ? logRange([values]) : {}),
       tooltip: tooltip(look, { trigger: 'axis', formatter: (points: { axisValue: number }[]) => {
         const at = Math.round(points[0]!.axisValue);
         return tip(`Up to evaluation ${count(at)}`, shown.slice(0, 16).map(({ one, best }) => [nameOf(one), number(best[Math.min(at, best.length) - 1], 5)]));
@@ -186,7 +187,7 @@ export function repetitionSection(data: ReportData): Section | null {
   const { all, parameters } = repetitions;
   const best = least(all);
   const courses = coursesOf(data, repetitions);
-  const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), number(one.aggregate, 6), count(one.best), count(one.loops), one.termination]);
+  const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), number(one.aggregate, 6), count(one.best), one.termination ? count(one.loops) : '', one.termination || 'it had not ended']);
   return {
     id: 'repetitions',
     title: 'The search with other seeds',
