@@ -39,6 +39,7 @@ void addFront(const RunConfig& config, const std::string& filePrefix, std::size_
   const std::vector<std::size_t> pairs = measuresOfDistinctPairs(config.measures);
   if (!data.front || pairs.empty()) return;
   std::vector<std::string> shown;
+  shown.reserve(pairs.size());
   for (const std::size_t i : pairs) shown.push_back(pairName(config.measures, i));
   std::string fault;
   data.front->series = reportedFrontSeries(filePrefix, *data.front, seriesNames(config.measures, pairs), shown, fault);

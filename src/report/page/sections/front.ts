@@ -40,8 +40,8 @@ function withAbove(front: Front, places: number[], objective: number, place: num
 function costs(front: Front, places: number[], ends: number[]): Finding[] {
   const { objectives, numbers, suggested } = front;
   if (places.length === 1) return [{ kind: 'good', text: `Evaluation ${count(numbers[places[0]!]!)} is the best in every objective at once: none costs another anything.` }];
-  const found: Finding[] = [{ text: `${counted(places.length, 'set')} on the front: no set is better than one of them in every objective, and each of them is better than the others in one.` }];
-  const near = places.find((place) => isNear(front, places, place));
+  const found: Finding[] = [{ text: `${counted(places.length, 'set')} on the front: of none of them is there a set that is better in one objective and worse in no other.` }];
+  const near = [...(suggested === null ? [] : [suggested]), ...places].find((place) => isNear(front, places, place));
   if (near !== undefined) {
     found.push({ kind: 'good', text: `The objectives hardly conflict: evaluation ${count(numbers[near]!)} is within ${percent(kSame)} of the best of each.` });
   }

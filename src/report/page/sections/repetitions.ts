@@ -51,8 +51,8 @@ function findings(data: ReportData, repetitions: Repetitions): Finding[] {
   const isAgreed = 2 * near.length > all.length;
   const found: Finding[] = [
     { text: `The best aggregates of ${counted(all.length, 'repetition')}: least ${number(best, 6)}, median ${number(quantile(values, 0.5), 6)}, greatest ${number(values[values.length - 1], 6)}.` },
-    { kind: isAgreed ? 'good' : 'warning', text: `${count(near.length)} of ${counted(all.length, 'repetition')} ended within ${percent(kNear)} of the least value.${
-      isAgreed ? '' : all.length > 1 ? ' What the search finds depends on the seed: a larger budget helps, or taking the best of several repetitions, as here.' : ''}` },
+    ...(all.length < 2 ? [] : [{ kind: isAgreed ? 'good' as const : 'warning' as const, text: `${count(near.length)} of ${counted(all.length, 'repetition')} ended within ${percent(kNear)} of the least value.${
+      isAgreed ? '' : ' What the search finds depends on the seed: a larger budget helps, or taking the best of several repetitions, as here.'}` }]),
   ];
   const [without, unfinished] = [all.length - values.length, all.filter(({ termination }) => termination === '').length];
   if (without > 0) found.push({ kind: 'warning', text: `${counted(without, 'repetition')} found no value.` });
