@@ -272,6 +272,9 @@ std::optional<ReportedCovariance> reportedCovariance(const std::string& filePref
   }
   ReportedCovariance found;
   found.correlationFile = fileNameOf(correlationFile);
+  for (const std::string& line : limits.headLines) {
+    if (line.starts_with("Lag-1 correlation")) found.lagText = line;
+  }
   for (const std::vector<std::string>& cells : limits.rows) {
     if (!cells[*leftOut].empty()) {
       found.leftOut.push_back({cells.front(), cells[*leftOut]});

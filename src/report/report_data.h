@@ -9,9 +9,11 @@
 
 #include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
+#include "report/report_front.h"
 #include "report/report_glue.h"
 #include "report/report_morris.h"
 #include "report/report_posterior.h"
+#include "report/report_repetitions.h"
 #include "report/report_sobol.h"
 #include "report/series_above.h"
 #include "report/series_labels.h"
@@ -125,7 +127,8 @@ struct ReportedLeftOut {
   bool operator==(const ReportedLeftOut&) const = default;
 };
 
-/// The parameter covariance of a sensitivity analysis on the model scale, one entry per parameter that has a variance.
+/// The parameter covariance of a sensitivity analysis, or of a search by residuals, on the model scale, one entry per
+/// parameter that has a variance.
 struct ReportedCovariance {
   std::vector<std::string> names;
   std::vector<double> estimate;
@@ -135,6 +138,7 @@ struct ReportedCovariance {
   std::vector<std::vector<double>> correlation;
   std::string correlationFile;  ///< its name
   std::vector<ReportedLeftOut> leftOut;
+  std::string lagText;  ///< what the correlation of successive residuals makes of the limits; empty: not said
 };
 
 struct ReportedSensitivity {
@@ -204,6 +208,9 @@ struct ReportData {
   std::vector<ShownSeries> wholeSeries;  ///< `series` from the first to the last period; empty without `periods`
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;
+  std::optional<ReportedCovariance> estimate;  ///< of the parameters that a search by residuals has found
+  std::optional<ReportedFront> front;
+  std::optional<ReportedRepetitions> repetitions;
   std::vector<ReportedScreening> morris;
   std::optional<ReportedSobol> sobol;
   std::optional<ReportedGlue> glue;

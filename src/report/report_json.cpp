@@ -11,7 +11,10 @@
 #include "report/drawn_lines.h"
 #include "report/hydrograph_views.h"
 #include "report/json_writer.h"
+#include "report/report_front.h"
+#include "report/report_repetitions.h"
 #include "report/report_sample.h"
+#include "report/report_series.h"
 #include "report/report_validation.h"
 #include "report/thinning.h"
 
@@ -21,24 +24,6 @@ namespace {
 using Digits = JsonWriter::Digits;
 
 constexpr int kFormat = 1;
-
-/// The times as start and step where they are equidistant, else one by one.
-void writeTimes(JsonWriter& json, const std::vector<std::int64_t>& seconds) {
-  json.member("count", seconds.size());
-  if (seconds.empty()) return;
-  json.member("start", isoTime(seconds.front()));
-  const std::int64_t step = seconds.size() > 1 ? seconds[1] - seconds[0] : 0;
-  const bool isRegular =
-      step > 0 && std::adjacent_find(seconds.begin(), seconds.end(),
-                                     [step](std::int64_t a, std::int64_t b) { return b - a != step; }) == seconds.end();
-  if (isRegular) {
-    json.member("step", step * 1000);
-    return;
-  }
-  json.key("times").beginArray();
-  for (const std::int64_t second : seconds) json.integer(epochMilliseconds(second));
-  json.endArray();
-}
 
 void writeRun(JsonWriter& json, const ReportData& data) {
   const ReportedRun& run = data.run;
@@ -153,13 +138,6 @@ void writeAbove(JsonWriter& json, const SeriesAbove& above) {
   json.key("values").numbers(above.series.values, Digits::drawn).member("thinned", above.isThinned).endObject();
 }
 
-void writeBreaks(JsonWriter& json, std::string_view name, const DrawnLine& line) {
-  if (line.breaks.empty()) return;
-  json.key(name).beginArray();
-  for (const std::int64_t second : line.breaks) json.integer(epochMilliseconds(second));
-  json.endArray();
-}
-
 void writeDrawnLines(JsonWriter& json, const ShownSeries& series) {
   const DrawnLines lines = drawnLines(series);
   json.member("observedAsPoints", lines.observed.isPoints);
@@ -175,16 +153,8 @@ void writeScenarios(JsonWriter& json, const ReportData& data, const std::string&
   json.key("scenarios").beginArray();
   for (const ScenarioSeries& one : data.scenarioSeries) {
     if (one.measure != measure) continue;
-    const std::vector<float> none(one.series.values.size(), std::nanf(""));
-    ShownSeries shown{measure, one.series.seconds, none, none, one.series.values};
-    const DrawnLine line = drawnSimulated(shown.seconds, shown.best, shown.observed);
-    const std::size_t most = mostDrawnTimes(data.scenarioSeries.size());
-    const bool isThinned = shown.seconds.size() > most;
-    if (isThinned) shown = thinned(shown, most);
-    json.beginObject().member("number", one.number).member("thinned", isThinned);
-    writeTimes(json, shown.seconds);
-    json.key("values").numbers(shown.best, Digits::drawn);
-    writeBreaks(json, "breaks", line);
+    json.beginObject();
+    writeSimulated(json, one, data.scenarioSeries.size());
     json.endObject();
   }
   json.endArray();
@@ -320,6 +290,29 @@ void writeBands(JsonWriter& json, const ReportData& data) {
   json.endArray();
 }
 
+void writeCovariance(JsonWriter& json, const ReportedCovariance& covariance) {
+  json.beginObject().member("names", covariance.names);
+  json.key("estimate").numbers(covariance.estimate, Digits::table);
+  json.key("standardDeviation").numbers(covariance.standardDeviation, Digits::table);
+  json.key("lower95").numbers(covariance.lower95, Digits::table);
+  json.key("upper95").numbers(covariance.upper95, Digits::table);
+  const bool isShown = covariance.names.size() <= kMostShownParameters;
+  json.key("correlation").rows(isShown ? covariance.correlation : std::vector<std::vector<double>>{}, Digits::drawn);
+  if (!isShown) {
+    json.key("largestCorrelations").beginArray();
+    for (const auto& [i, j] : largestEntries(covariance.correlation)) {
+      json.beginObject().member("first", covariance.names[i]).member("second", covariance.names[j]);
+      json.member("value", covariance.correlation[i][j]).endObject();
+    }
+    json.endArray().member("correlationFile", covariance.correlationFile);
+  }
+  json.optionalMember("lagText", covariance.lagText).key("leftOut").beginArray();
+  for (const auto& [name, reason] : covariance.leftOut) {
+    json.beginObject().member("name", name).member("reason", reason).endObject();
+  }
+  json.endArray().endObject();
+}
+
 void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) {
   json.key("sensitivity").beginObject().member("parameters", sensitivity.parameters);
   json.member("outputs", sensitivity.outputs);
@@ -329,27 +322,7 @@ void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) 
   json.member("isOfObservations", sensitivity.isOfObservations).member("hasBetterFit", sensitivity.hasBetterFit);
   json.key("covariance");
   if (sensitivity.covariance) {
-    const ReportedCovariance& covariance = *sensitivity.covariance;
-    json.beginObject().member("names", covariance.names);
-    json.key("estimate").numbers(covariance.estimate, Digits::table);
-    json.key("standardDeviation").numbers(covariance.standardDeviation, Digits::table);
-    json.key("lower95").numbers(covariance.lower95, Digits::table);
-    json.key("upper95").numbers(covariance.upper95, Digits::table);
-    const bool isShown = covariance.names.size() <= kMostShownParameters;
-    json.key("correlation").rows(isShown ? covariance.correlation : std::vector<std::vector<double>>{}, Digits::drawn);
-    if (!isShown) {
-      json.key("largestCorrelations").beginArray();
-      for (const auto& [i, j] : largestEntries(covariance.correlation)) {
-        json.beginObject().member("first", covariance.names[i]).member("second", covariance.names[j]);
-        json.member("value", covariance.correlation[i][j]).endObject();
-      }
-      json.endArray().member("correlationFile", covariance.correlationFile);
-    }
-    json.key("leftOut").beginArray();
-    for (const auto& [name, reason] : covariance.leftOut) {
-      json.beginObject().member("name", name).member("reason", reason).endObject();
-    }
-    json.endArray().endObject();
+    writeCovariance(json, *sensitivity.covariance);
   } else {
     json.null();
   }
@@ -378,6 +351,9 @@ std::string reportJson(const ReportData& data) {
   writeValidation(json, data);
   writeBands(json, data);
   if (data.sensitivity) writeSensitivity(json, *data.sensitivity);
+  if (data.estimate) writeCovariance(json.key("estimate"), *data.estimate);
+  if (data.front) writeFront(json, *data.front);
+  if (data.repetitions) writeRepetitions(json, *data.repetitions);
   if (!data.morris.empty()) writeMorris(json, data.morris);
   if (data.sobol) writeSobol(json, *data.sobol);
   if (data.glue) writeGlue(json, *data.glue);

@@ -33,6 +33,7 @@
 #include "report/report_file.h"
 #include "report/report_parameters.h"
 #include "report/report_sample.h"
+#include "report/report_searches.h"
 #include "report/report_validation.h"
 #include "report/run_sources.h"
 #include "run/results/restart_settings.h"
@@ -141,6 +142,7 @@ ReportData ReportBuilder::build() {
   addSeries();
   addValidation(config_, sources_.results.rows, best_, data_);
   addAnalyses();
+  addSearchTables(config_, filePrefix_, space().size(), data_);
   return std::move(data_);
 }
 
@@ -243,10 +245,15 @@ void ReportBuilder::findBestAndInitial() {
   }
   if (best.best()) best_ = rowOf(best.best()->number);
   if (initial.number()) initial_ = rowOf(*initial.number());
-  // The search knows which of equally good ones it took.
+  // The search knows which of equally good ones it took; one by residuals judges by their sum of squares, which may
+  // differ a little from the aggregate.
   if (const auto& recorded = sources_.record.best) {
     const ResultRow* row = rowOf(recorded->number);
-    if (row != nullptr && best_ != nullptr && row->ok && row->aggregate == best_->aggregate) best_ = row;
+    const bool isOfSearch = data_.run.task == "optimisation" && sources_.stage == RunStage::finished;
+    if (row != nullptr && best_ != nullptr && row->ok &&
+        row->aggregate == (isOfSearch ? recorded->aggregate : best_->aggregate)) {
+      best_ = row;
+    }
   }
   if (best_ != nullptr) data_.best = ShownEvaluation{best_->number, best_->aggregate};
   data_.initialNumber = initial.number();
@@ -489,7 +496,7 @@ void ReportBuilder::addAnalyses() {
     for (const std::string& fault : faults) note(fault + ".");
   }
   if (task.distributions != nullptr) data_.distributions = reportedDistributions(*task.distributions, space());
-  if ((task.distributions != nullptr || task.isGlue) && hasAnalysis) {
+  if (task.hasBands && task.chains == nullptr && hasAnalysis) {  // of other tasks it would be that of an earlier run
     std::string fault;
     data_.sampleSensitivity = reportedSampleSensitivity(filePrefix_, space().names, fault);
     if (!fault.empty()) note(fault + ".");

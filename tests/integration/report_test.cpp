@@ -278,6 +278,49 @@ TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
   EXPECT_THAT(ofNone.error, HasSubstr("basin.dat: it holds no evaluation"));
 }
 
+TEST(Report, OfASearchHasTheTablesThatItLeftAndSaysWhichCannotBeRead) {
+  const ModelFolder folder;
+  folder.writeSetup({.search = "GLM", .maxEvaluations = 30});
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(reportData(folder), AllOf(HasSubstr(R"("estimate":{"names":["a","b"],"estimate":[)"),
+                                        Not(HasSubstr("\"front\"")), Not(HasSubstr("\"repetitions\""))));
+  const std::string head = "Evaluation\tRank\tCrowding\tViolation\tSuggested\tDistance\terror\ta\tb\n";
+  folder.write("basin_Pareto.dat", head + "3\t1\tInf\t0\t1\t0\t0.5\t4\t2\n");
+  folder.write("basin_ParetoSeries.dat",
+               "Evaluation\tMeasure\tTime\tSimulated\n3\tflow\t2001-01-01T00:00:00\t1.5\n# endOfEvaluation\t3\n");
+  folder.write("basin_Optimisation_Repetitions.dat", "Repetition\tSeed\n1\t2\n");
+  std::filesystem::remove(folder / "basin_Optimisation_Correlation.dat");
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(
+      reportData(folder),
+      AllOf(
+          Not(HasSubstr("\"estimate\":{")), HasSubstr(R"("front":{"objectives":["error"],"parameters":["a","b"],)"),
+          HasSubstr(R"("series":[{"measure":"flow","number":3,)"),
+          HasSubstr(
+              "limits of the parameters are not shown: basin_Optimisation_Correlation.dat: No such file or directory."),
+          HasSubstr("How the front grew is not shown: basin_ParetoCourse.dat: No such file or directory."),
+          HasSubstr("The repetitions are not shown: basin_Optimisation_Repetitions.dat is damaged, or of other "
+                    "parameters than the setup.")));
+  std::filesystem::remove(folder / "basin_Optimisation_ParameterLimits.dat");
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder), HasSubstr("not shown: basin_Optimisation_ParameterLimits.dat is not there."));
+}
+
+TEST(Report, OfAScreeningShowsDistributionsThatTheSetupGivesAlone) {
+  const ModelFolder folder;
+  folder.writeSetup({.option = 1});
+  folder.editSetup("Sensitivity_Type = 0", "Sensitivity_Type = 'Morris'");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(reportData(folder), HasSubstr(R"("distributions":[])"));
+  // Of an uncertainty analysis with the same setup.
+  folder.write("basin_SampleSensitivities.dat", "Kind\tOutput\tParameter\tRankCorrelation\tFirstOrder\tLower\tUpper\n");
+  folder.editSetup("Sensitivity_Type = 'Morris'",
+                   "Sensitivity_Type = 'Morris'\n[PARAMETER_2]\nDistribution = 'triangular'\nMode_Value = 2\n[/PARAMETER_2]");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(reportData(folder), AllOf(HasSubstr(R"("distributions":[{"text":"uniform)"),
+                                        HasSubstr(R"({"text":"triangular)"), Not(HasSubstr("sampleSensitivity"))));
+}
+
 TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {
   const ModelFolder folder;
   folder.writeSetup({.option = 0});

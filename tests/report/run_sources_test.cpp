@@ -64,6 +64,7 @@ TEST(ReportedCovariance, IsThatOfTheAnalysisToTheLastBit) {
   EXPECT_THAT(reported->names, ElementsAre(space.names[0], space.names[2]));
   EXPECT_THAT(reported->leftOut, ElementsAre(ReportedLeftOut{space.names[1], covariance.leftOut[0].reason}));
   EXPECT_EQ(reported->correlation, covariance.correlation);
+  EXPECT_THAT(reported->lagText, ::testing::StartsWith("Lag-1 correlation of the residuals: -0."));
   const std::vector<ParameterLimits> limits = parameterLimits(covariance, space, space.initial);
   EXPECT_THAT(reported->estimate, ElementsAre(1.0 / 3.0, std::exp(-1.0)));
   EXPECT_THAT(reported->standardDeviation, ElementsAre(limits[0].standardDeviation, limits[1].standardDeviation));

@@ -43,11 +43,21 @@ export interface ChartPlan {
   values?: () => Values;
   csv?: () => Values; // where it is not `values`; a chart without both draws points, and has their coordinates
   thinned?: boolean; // its file says so
+  pick?: Pick;
+}
+
+/** What a reader picks in a chart: by a click, and by the left and right arrow keys while it has the focus. */
+export interface Pick {
+  at: (item: { seriesId?: string; dataIndex: number; value: unknown; name?: string }) => void;
+  step: (by: number) => void;
+  /** The series that show what is picked, with the ids that they have among those of `option`. */
+  marks: (look: Look) => object[];
 }
 
 export type { Values };
 
-export type Chart = HTMLElement & { redraw: () => void };
+/** `mark`: something else is picked; the chart stays as it is otherwise. */
+export type Chart = HTMLElement & { redraw: () => void; mark: () => void };
 
 const kRowsShown = 200;
 const kPaperWidth = 680; // CSS pixels: A4 without its margins
@@ -109,12 +119,18 @@ class Drawn {
   draw(): void {
     if (this.chart) return;
     this.chart = init(this.canvas, null, { height: this.plan.height });
+    this.chart.on('click', (item) => this.plan.pick?.at(item as Parameters<Pick['at']>[0]));
     this.refresh();
   }
 
   redraw(): void {
     if (this.isInView) this.refresh();
     else this.isStale = true;
+  }
+
+  mark(): void {
+    if (this.plan.pick) this.chart?.setOption({ series: this.plan.pick.marks(look()) });
+    this.chart?.getZr().flush();
   }
 
   private refresh(width = this.canvas.clientWidth): void {
@@ -153,8 +169,15 @@ class Drawn {
     this.chart?.dispatchAction({ type: 'dataZoom', start: 0, end: 100 });
   }
 
-  /** By keyboard: plus and minus zoom, the arrows move along the horizontal axis, Escape shows everything again. */
-  zoomByKey(event: KeyboardEvent): void {
+  /** By keyboard: plus and minus zoom, the arrows move along the horizontal axis or pick the next one, Escape shows everything again. */
+  takeKey(event: KeyboardEvent): void {
+    const steps: Record<string, number> = { ArrowLeft: -1, ArrowRight: 1 };
+    if (this.plan.pick && steps[event.key] && !event.ctrlKey && !event.metaKey && !event.altKey) {
+      event.preventDefault();
+      this.plan.pick.step(steps[event.key]!);
+      return;
+    }
+    if (!this.plan.zoom) return;
     if (event.key === 'Escape') this.resetZoom();
     const { start = 0, end = 100 } = (this.chart?.getOption() as { dataZoom?: Zoom[] }).dataZoom?.[0] ?? {};
     const span = end - start;
@@ -346,9 +369,10 @@ export function lineEntries(names: string[]): object[] {
 }
 
 export function chart(plan: ChartPlan): Chart {
+  const keys = [plan.zoom ? 'Plus and minus zoom' : '', plan.pick ? 'left and right arrow keys pick the next one' : plan.zoom ? 'arrow keys move along' : '',
+    plan.zoom ? 'Escape shows everything' : ''].filter(Boolean).join(', ');
   const canvas = make('div', {
-    class: 'canvas', role: 'img', style: `height: ${plan.height}px`, tabindex: plan.zoom ? 0 : null,
-    'aria-label': plan.zoom ? `${plan.title}. Plus and minus zoom, arrow keys move along, Escape shows everything.` : plan.title,
+    class: 'canvas', role: 'img', style: `height: ${plan.height}px`, tabindex: keys ? 0 : null, 'aria-label': keys ? `${plan.title}. ${keys[0]!.toUpperCase()}${keys.slice(1)}.` : plan.title,
   });
   const note = make('p', { class: 'note' });
   const tools = make('div', { class: 'tools' });
@@ -373,8 +397,8 @@ export function chart(plan: ChartPlan): Chart {
   for (const { label, first, last } of plan.spans ?? []) {
     tools.append(make('button', { type: 'button', title: `Zoom to ${label}`, onclick: () => drawn.zoomTo(first, last) }, shorten(label, 24)));
   }
+  if (keys) canvas.addEventListener('keydown', (event) => drawn.takeKey(event));
   if (plan.zoom) {
-    canvas.addEventListener('keydown', (event) => drawn.zoomByKey(event));
     tools.append(make('button', {
       type: 'button', class: 'reset', onclick: () => drawn.resetZoom(),
       title: 'Drag across the chart to zoom in, or hold Ctrl and turn the wheel, or press + and \u2212 in it. A double click or Escape shows everything again.',
@@ -396,6 +420,10 @@ export function chart(plan: ChartPlan): Chart {
     redraw: () => {
       renote();
       drawn.redraw();
+    },
+    mark: () => {
+      renote();
+      drawn.mark();
     },
   });
 }

@@ -264,6 +264,40 @@ export interface Covariance {
   largestCorrelations?: { first: string; second: string; value: Maybe }[]; // then these
   correlationFile?: string; // which has all of them
   leftOut: { name: string; reason: string }[];
+  lagText?: string | null; // what the correlation of successive residuals makes of the limits
+}
+
+/** The sets that a search by several objectives ends with, by rank and then by the first objective; columns have one value per set. */
+export interface Front {
+  objectives: string[];
+  parameters: string[];
+  numbers: number[]; // of the evaluations
+  ranks: number[]; // 1: on the front
+  violations: Maybe[]; // of the internal constraints; 0: feasible
+  distances: Maybe[]; // from the ideal point, objectives scaled over the front
+  suggested: number | null; // place of the compromise
+  values: Maybe[][]; // one column per objective function
+  parameterValues: Maybe[][];
+  course?: { evaluations: Maybe[]; sizes: Maybe[]; hypervolumes: Maybe[] };
+  series: (Scenario & { measure: string })[]; // of some sets
+}
+
+/** A search with one of the seeds. */
+export interface Repetition {
+  number: number;
+  seed: number;
+  evaluations: number;
+  best: number; // evaluation
+  aggregate: Maybe;
+  loops: number;
+  parameters: Maybe[]; // of its best set
+  termination: string;
+}
+
+export interface Repetitions {
+  parameters: string[];
+  all: Repetition[];
+  stretches: [number, number, number][]; // repetition, first and last of successive evaluations of it
 }
 
 export interface Sensitivity {
@@ -376,6 +410,9 @@ export interface ReportData {
   validation?: Validation | null;
   band: Band[];
   sensitivity: Sensitivity | null;
+  estimate?: Covariance | null; // of the parameters that a search by residuals has found
+  front?: Front | null;
+  repetitions?: Repetitions | null;
   morris: Screening[];
   sobol?: Sobol | null;
   glue?: Glue | null;

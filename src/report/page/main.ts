@@ -5,11 +5,14 @@ import { make } from './dom';
 import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
 import { comparisonSection } from './sections/comparisons';
+import { estimateSection } from './sections/estimate';
+import { frontSection } from './sections/front';
 import { glueSection } from './sections/glue';
 import { historySection } from './sections/histories';
 import { morrisSection } from './sections/morris';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { posteriorSection } from './sections/posterior';
+import { repetitionSection } from './sections/repetitions';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
 import { sampleSection } from './sections/sample';
 import type { Section } from './sections/section';
@@ -26,6 +29,9 @@ function sections(data: ReportData): Section[] {
     bandSection(data),
     glueSection(data),
     posteriorSection(data),
+    frontSection(data),
+    repetitionSection(data),
+    estimateSection(data),
     sensitivitySection(data),
     morrisSection(data),
     sobolSection(data),

@@ -24,11 +24,14 @@ class MorrisTask final : public Task {
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
-  TaskReport report() const override { return {.hasMorris = true}; }
+  TaskReport report() const override {
+    return {.hasMorris = true, .distributions = givesDistributions && distributions ? &*distributions : nullptr};
+  }
 
   MorrisSettings settings;
   /// Without one, each parameter is uniform between its bounds.
   std::optional<ParameterDistributions> distributions;
+  bool givesDistributions = false;  ///< the setup has one for some parameter, which is worth a chart
 
  private:
   ParameterDistributions distributionsIn(const SearchSpace& space) const;

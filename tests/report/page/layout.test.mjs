@@ -51,7 +51,7 @@ function misfits() {
 }
 
 const cases = {
-  search: sample.dataOf('optimisation'), 'search with two series': sample.twoSeries(), 'search of 14 parameters': sample.manyParameters(14),
+  'search by three objectives': sample.withTables(3), 'search with two series': sample.twoSeries(), 'search of 14 parameters': sample.manyParameters(14),
   uncertainty: sample.dataOf('uncertainty'), sensitivity: sample.dataOf('sensitivity'), screening: sample.dataOf('screening'), scenarios: sample.dataOf('scenarios'),
 };
 

@@ -60,7 +60,7 @@ const cases = {
   'scenario runs': [sample.dataOf('scenarios'), 4 + 1 + 2, ['series', 'parameters', 'results', 'compared', 'progress', 'dotty', 'run', 'summary']],
   'a run without an evaluation': [sample.empty(), 0, ['run']],
   'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
-  'a search with hostile names': [sample.hostile(sample.dataOf('optimisation')), 3 + 2 + 2 + 2 + 2, kOptimisation, true],
+  'a search by four objectives with hostile names': [sample.hostile(sample.withTables(4)), 5 + 3 + 2 + 11, ['front', 'repetitions', 'estimate', ...kOptimisation], true],
   'an uncertainty analysis with hostile names': [sample.hostile(sample.dataOf('uncertainty')), 14, null, true],
   'a Morris screening with hostile names': [sample.hostile(sample.dataOf('screening')), 7, null, true],
   'a sensitivity analysis with hostile names': [sample.hostile(sample.dataOf('sensitivity')), 7, null, true],
@@ -301,6 +301,61 @@ test('GLUE says which parameters the observations tell something of, and how muc
   await withReport(data, {}, async (page) => {
     assert.equal(await page.locator('#glue figure').count(), 0);
     assert.ok((await page.locator('#glue').textContent()).includes('neither quantiles nor bands'));
+  });
+});
+
+test('a point of a front is picked in the chart, by keyboard and in the table, and its parameters and hydrograph are shown', async () => {
+  const data = sample.withTables(2);
+  const { front } = data;
+  Object.assign(data.estimate, { lower95: [3.9, -20], upper95: [4.1, 20], correlation: [[1, -0.97], [-0.97, 1]] });
+  data.parameters[1].nearBound = 'lower';
+  await withReport(data, {}, async (page) => {
+    const shown = await page.locator('#front').innerText();
+    for (const text of ['The best gauge 1 is 0.5 (evaluation 1). gauge 2 is 2.5 there, 400 % above its best, 0.5.', 'A suggestion for a compromise is evaluation 11: gauge 1 0.777, 55.4 % above its best; gauge 2',
+      'nearest to the ideal one', 'no more than a suggestion', 'The front still grew: its hypervolume by 10 %']) assert.ok(shown.replace(/[\u2068\u2069]/g, '').includes(text), `${text}: ${shown}`);
+    const figure = page.locator('#front figure').first();
+    const hydrograph = page.locator('#front figure', { hasText: 'Simulated and observed: flow' });
+    const picked = async () => [await page.locator('#front h3', { hasText: 'picked' }).textContent(),
+      await figure.evaluate((element) => window.drawnOptions(element).series.find(({ id }) => id === 'picked0').data[0][2]),
+      await hydrograph.evaluate((element) => { const { data: points } = window.drawnOptions(element).series.find(({ id }) => id === 'picked'); return points.length > 0 ? Number(points[1].toPrecision(6)) : null; })];
+    const expected = (set) => [`The point that is picked: evaluation ${front.numbers[set]}`, set, front.series.find(({ number }) => number === front.numbers[set])?.values[0] ?? null];
+    const isPicked = async (set, how) => {
+      const [title, place, value] = await picked();
+      const [wantedTitle, wantedPlace, wanted] = expected(set);
+      assert.deepEqual([title, place, value], [wantedTitle, wantedPlace, wanted === null ? null : Number(wanted.toPrecision(6))], how);
+    };
+    await isPicked(10, 'at first the suggestion');
+    await figure.locator('.canvas').focus();
+    await page.keyboard.press('+');
+    await page.keyboard.press('ArrowRight');
+    await isPicked(11, 'by keyboard');
+    assert.deepEqual(await zoomOf(page, await figure.elementHandle()), [25, 75], 'the chart stays zoomed in');
+    assert.match(await page.locator('#front').textContent(), /The series of evaluation 12 is not kept: those of 10 of the 20 points of the front are/);
+    await page.keyboard.press('Escape');
+    const [x, y] = await figure.evaluate((element) => {
+      const { left, top } = element.querySelector('.canvas').getBoundingClientRect();
+      const drawing = new DOMParser().parseFromString(window.drawingOf(element, element.querySelector('.canvas').clientWidth), 'image/svg+xml');
+      const dot = drawing.querySelector('path[ecmeta_series_index="1"][ecmeta_data_index="19"][transform^="matrix"]');
+      const [, , , , across, down] = dot.getAttribute('transform').match(/-?[\d.]+/g).map(Number);
+      return [left + across, top + down];
+    });
+    await page.mouse.click(x, y);
+    await isPicked(19, 'by a click on the last dot');
+    await page.locator('#front details.view summary').click();
+    await page.locator('#front details.view button', { hasText: /^4$/ }).press('Enter');
+    await isPicked(3, 'in the table');
+    assert.equal(await page.locator('#front details.view [aria-pressed="true"]').textContent(), '4');
+    const parameters = page.locator('[aria-label="Parameters of the point that is picked"] td').first();
+    assert.equal(Number(await parameters.textContent()), Number(front.parameterValues[0][3].toPrecision(8)));
+    assert.deepEqual(await blankCharts(page), []);
+
+    const words = (await page.locator('#repetitions .findings').innerText()).replace(/[\u2068\u2069]/g, '');
+    for (const text of ['2 of 3 repetitions ended within 1 %', 'These 2 agree in the value, but not in b (1 to 4, 60 % of its range)']) assert.ok(words.includes(text), words);
+    const courses = await page.locator('#repetitions figure').first().evaluate((element) => window.drawnOptions(element).series.map(({ data: steps }) => steps.at(-1)));
+    const bestOf = (number) => data.repetitions.stretches.filter(([of]) => of === number).flatMap(([, first, last]) => data.evaluations.aggregate.slice(first - 1, last)).filter((value) => value !== null).reduce((a, b) => Math.min(a, b));
+    assert.deepEqual(courses.map(([, value]) => value), [1, 2, 3].map(bestOf), 'each course is that of its own stretches');
+    const limits = (await page.locator('#estimate .findings').innerText()).replace(/[\u2068\u2069]/g, '');
+    for (const text of ['Well determined, their limits less than 10 % of the range between the bounds apart: a (2 %)', 'Hardly determined, their limits at least 50 % of the range apart: b (800 %)', 'a and b (correlation \u22120.97)', 'At a bound, where the limits say little: b (lower)']) assert.ok(limits.includes(text), limits);
   });
 });
 

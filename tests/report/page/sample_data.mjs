@@ -74,6 +74,39 @@ export function stretched(count, days) {
   return data;
 }
 
+/** A front of so many objectives with other sets of its population, a compromise, and the series of every second set. */
+function frontOf(data, count) {
+  const { evaluations, series: [series] } = data;
+  const sets = Array.from({ length: 24 }, (_, set) => set);
+  const share = (set) => (set % 20) / 19; // along the front; the last four lie behind it
+  const values = Array.from({ length: count }, (_, objective) => sets.map((set) => (set < 20 ? 1 : 1.3) * (1 + objective) * (objective % 2 === 0 ? share(set) ** 2 : (1 - share(set)) ** 2) + 0.5));
+  const kept = sets.filter((set) => set < 20 && set % 2 === 0);
+  return {
+    objectives: values.map((_, objective) => `gauge ${objective + 1}`), parameters: data.parameters.filter(({ kind }) => kind === 'variable').map(({ name }) => name),
+    numbers: sets.map((set) => evaluations.numbers[set]), ranks: sets.map((set) => (set < 20 ? 1 : 2)), violations: sets.map(() => 0), distances: sets.map((set) => Math.abs(share(set) - 0.5)),
+    suggested: 10, values, parameterValues: evaluations.parameters.map((column) => sets.map((set) => column[set])),
+    course: { evaluations: [30, 60, 90, 120], sizes: [4, 9, 15, 20], hypervolumes: [1, 1.8, 1.98, 2] },
+    series: kept.map((set) => ({ measure: series.measure, number: evaluations.numbers[set], start: series.start, step: series.step, count: series.count, thinned: false, values: series.best.map((value) => value * (1 + 0.02 * set)) })),
+  };
+}
+
+/** Three repetitions that took turns: two end at the same value with other values of the second parameter, one elsewhere. */
+function repetitionsOf(data) {
+  const { evaluations, best } = data;
+  const parameters = data.parameters.filter(({ kind }) => kind === 'variable');
+  const one = (number, aggregate, second) => ({ number, seed: 4 + number, evaluations: evaluations.count / 3, best: best.number, aggregate, loops: 7, termination: 'the budget is used up',
+    parameters: [parameters[0].best, second] });
+  const stretches = Array.from({ length: 6 }, (_, turn) => [1 + turn % 3, 1 + turn * evaluations.count / 6, (turn + 1) * evaluations.count / 6]);
+  return { parameters: parameters.map(({ name }) => name), stretches, all: [one(1, best.aggregate, 1), one(2, best.aggregate * 1.005, 4), one(3, best.aggregate * 2 + 1, 2.5)] };
+}
+
+/** A search with all that one can leave beside its results: limits of its parameters, a front of so many objectives, repetitions. */
+export function withTables(objectives) {
+  const data = dataOf('optimisation');
+  const { covariance } = dataOf('sensitivity').sensitivity;
+  return Object.assign(data, { front: frontOf(data, objectives), repetitions: repetitionsOf(data), estimate: { ...covariance, lagText: 'Lag-1 correlation of the residuals: 0.600' } });
+}
+
 /** Nothing but what every run has. */
 export function empty() {
   const { format, program, run } = dataOf('optimisation');
@@ -101,6 +134,17 @@ export function hostile(data) {
     data.sensitivity.covariance.names = data.sensitivity.covariance.names.map(rename);
     data.sensitivity.covariance.leftOut = [{ name: kHostile[0], reason: kHostile[1] }];
   }
+  if (data.front) {
+    for (const key of ['objectives', 'parameters']) data.front[key] = data.front[key].map(rename);
+    data.front.series.forEach((one) => { one.measure = rename(one.measure); });
+    data.front.course.hypervolumes[1] = data.front.distances[3] = null;
+  }
+  if (data.repetitions) {
+    data.repetitions.parameters = data.repetitions.parameters.map(rename);
+    data.repetitions.all.forEach((one, place) => { one.termination = kHostile[place]; });
+    Object.assign(data.repetitions.all[2], { aggregate: null, parameters: [null, null] });
+  }
+  if (data.estimate) Object.assign(data.estimate, { names: data.estimate.names.map(rename), lagText: kHostile[0], leftOut: [{ name: kHostile[1], reason: kHostile[2] }] });
   for (const screening of data.morris ?? []) {
     screening.name = rename(screening.name);
     for (const parameter of screening.parameters) parameter.name = rename(parameter.name);

@@ -3,7 +3,7 @@ import { variableParameters, type Parameter, type ReportData } from '../data';
 import { make, shorten, table } from '../dom';
 import { count, counted, duration, kMissing, number, percent } from '../format';
 import { bestShare, placeBetweenBounds } from '../numbers';
-import { heading, paragraph, type Section } from './section';
+import { heading, isolated, paragraph, type Section } from './section';
 
 interface Finding {
   kind: 'good' | 'plain' | 'warning';
@@ -19,7 +19,7 @@ function folded(all: { name: string; text: string }[], others: string): Finding[
   const found = all.slice(0, kFindingsShown).map(({ text }): Finding => ({ kind: 'plain', text }));
   const more = all.slice(kFindingsShown);
   if (more.length === 0) return found;
-  const names = more.slice(0, 10).map(({ name }) => named(name)).join(', ');
+  const names = more.slice(0, 10).map(({ name }) => isolated(name)).join(', ');
   return [...found, { kind: 'plain', text: `${count(more.length)} more ${others}: ${names}${more.length > 10 ? ', \u2026' : ''}`, more: more.map(({ text }) => text) }];
 }
 
@@ -30,9 +30,6 @@ const kStates = {
   cancelled: { mark: '\u25a0', text: 'Cancelled', kind: 'warning' },
   failed: { mark: '\u2715', text: 'Failed', kind: 'bad' },
 } as const;
-
-/** The name of a parameter, measure or objective in a sentence, isolated: its writing direction stays its own. */
-const named = (name: string) => `\u2068${shorten(name, 60)}\u2069`;
 
 function improvement(data: ReportData): Finding | null {
   const { best, run, evaluations } = data;
@@ -57,20 +54,20 @@ function findings(data: ReportData): Finding[] {
     const figures = series.figures?.best;
     if (!figures) return [];
     const of = series.bestNumber != null && series.bestNumber !== data.best?.number ? `, evaluation ${count(series.bestNumber)}` : '';
-    const text = `${named(series.measure)} in the evaluation period${of}: NSE ${number(figures.nse, 3)}, KGE ${number(figures.kge, 3)}, bias ${number(figures.pbias, 3)} %.`;
+    const text = `${isolated(series.measure)} in the evaluation period${of}: NSE ${number(figures.nse, 3)}, KGE ${number(figures.kge, 3)}, bias ${number(figures.pbias, 3)} %.`;
     return [{ name: series.measure, text }];
   }), 'series'));
   found.push(...folded(data.band.map((band) => ({
-    name: band.measure, text: `${percent(band.inside)} of the observed values of ${named(band.measure)} lie within the 5 to 95 % band.`,
+    name: band.measure, text: `${percent(band.inside)} of the observed values of ${isolated(band.measure)} lie within the 5 to 95 % band.`,
   })), 'bands'));
   if (data.sensitivity && data.sensitivity.ranking.length > 0) {
-    const first = data.sensitivity.ranking.slice(0, 3).map(named).join(', ');
+    const first = data.sensitivity.ranking.slice(0, 3).map(isolated).join(', ');
     found.push({ kind: 'plain', text: `Most sensitive: ${first}.` });
   }
   // Only a search would have gone on behind a bound.
   const near = run.task === 'optimisation' ? data.parameters.filter((parameter) => parameter.nearBound) : [];
   if (near.length > 0) {
-    const names = near.slice(0, 6).map((parameter) => `${named(parameter.name)} (${parameter.nearBound})`).join(', ');
+    const names = near.slice(0, 6).map((parameter) => `${isolated(parameter.name)} (${parameter.nearBound})`).join(', ');
     const rest = near.length > 6 ? ` and ${near.length - 6} more` : '';
     found.push({ kind: 'warning', text: `Best value near a bound: ${names}${rest}. A wider bound may fit better.` });
   }

@@ -8,7 +8,7 @@ import { finite } from '../numbers';
 import { logRange } from '../ticks';
 import { heatmap } from './heatmap';
 import { pairPlots } from './pairs';
-import { grid, heading, paragraph, type Section } from './section';
+import { grid, heading, isolated, paragraph, type Section } from './section';
 import type { CustomApi } from './uncertainty';
 
 const kMostLines = 8; // dimensions with a line of their own
@@ -16,8 +16,6 @@ const kMostGrown = 60; // dimensions with charts of their own
 const kWanted = 0.9; // share of what is observed that a band of everything should hold
 const kAround = 0.05;
 
-// Names in isolates, so that those written from right to left do not turn the sentence around.
-const isolated = (name: string) => `\u2068${shorten(name, 60)}\u2069`;
 const sentence = (text: string) => (/[.!?]$/.test(text) ? text : `${text}.`);
 
 function finding(text: string, kind: string): HTMLElement {

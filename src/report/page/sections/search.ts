@@ -1,10 +1,11 @@
 // The course of the search, and what the evaluations tell of each parameter.
-import { axis, chart, kFileWidth, legend, lineEntries, tip, tooltip, type Chart, type ChartPlan } from '../chart';
+import { axis, chart, legend, lineEntries, tip, tooltip, type Chart, type ChartPlan } from '../chart';
 import { variableParameters, type Maybe, type Parameter, type ReportData } from '../data';
 import { choice, shorten } from '../dom';
-import { count, number, tick } from '../format';
+import { count, number } from '../format';
 import { axisTop, bestShare, bestSoFar, correlation, finite, ofDifferentSets, placeBetweenBounds, quantile, sorted, spaced, thin } from '../numbers';
 import { heatmap } from './heatmap';
+import { parameterAxis, parallelPlan } from './parallel';
 import { grid, paragraph, type Section } from './section';
 
 const kGoodShare = 0.1;
@@ -143,56 +144,27 @@ function nameOfGood(sets: number, good: number[]): string {
   return isShare ? `best tenth (${count(good.length)} sets)` : `${count(good.length)} best sets`;
 }
 
-function parallelPlan(data: ReportData, good: number[], name: string): ChartPlan {
+function goodSetsPlan(data: ReportData, good: number[], name: string): ChartPlan {
   const variable = variableParameters(data);
   const { aggregate, parameters, numbers } = data.evaluations;
-  const drawn = spaced(good.length, kLinesDrawn).map((rank) => good[rank]!).reverse(); // the best on top
-  const values = drawn.map((place) => ({
-    value: [...variable.map((_, index) => parameters[index]?.[place] ?? NaN), aggregate[place]!], name: numbers[place],
-  }));
-  // Where axes are close, their names are at a slant and their numbers, which would overlap, are left to the tooltip.
-  const apart = (width: number) => (width - 120) / variable.length;
-  const isClose = (width: number) => apart(width) < 110;
-  return {
+  const places = spaced(good.length, kLinesDrawn).map((rank) => good[rank]!).reverse(); // the best on top
+  return parallelPlan({
     title: `Parallel coordinates of the ${name}`,
     note: `Each line is a parameter set, the colour its aggregate; the thick line is the best. Drag along an axis to pick lines.${
-      good.length > drawn.length ? ` ${count(drawn.length)} of ${count(good.length)} lines are drawn.` : ''}`,
-    height: 400,
-    switches: [{ key: 'fit', label: 'Fit axes', hint: 'Axes over the values of these sets instead of the bounds' }],
-    fitsWidth: true,
-    option: (look, is, width = kFileWidth) => ({
-      parallelAxis: [...variable.map((parameter, dim) => ({
-        dim, name: shorten(parameter.name, isClose(width) ? 12 : 18), scale: true, min: is('fit') ? 'dataMin' : parameter.lower, max: is('fit') ? 'dataMax' : parameter.upper,
-        type: parameter.transformation === 'logarithmic' && (parameter.lower ?? 0) > 0 ? 'log' : 'value', minInterval: parameter.integer ? 1 : undefined,
-      })), { dim: variable.length, name: 'Aggregate', scale: true, type: 'value' }],
-      parallel: {
-        left: 50, right: 70, top: isClose(width) ? 84 : 48, bottom: 24,
-        parallelAxisDefault: {
-          nameLocation: 'end', nameGap: 16, nameRotate: isClose(width) ? 45 : undefined, nameTextStyle: { color: look.ink, fontSize: 12 },
-          axisLine: { lineStyle: { color: look.muted } }, axisTick: { lineStyle: { color: look.muted } },
-          axisLabel: { color: look.muted, fontSize: 10, formatter: apart(width) < 52 ? () => '' : tick },
-          areaSelectStyle: { color: look.band, borderColor: look.band, opacity: 0.3, width: 16 },
-        },
-      },
-      visualMap: {
-        show: false, dimension: variable.length, seriesIndex: 0, inRange: { color: look.sequential },
-        min: aggregate[good[0]!]!, max: aggregate[good[good.length - 1]!]!,
-      },
-      tooltip: tooltip(look, { trigger: 'item', formatter: (line: { name: string; value: number[] }) => tip(`Evaluation ${line.name}`,
-        [...variable.map((parameter, index): [string, string] => [shorten(parameter.name, 40), number(line.value[index], 5)]).slice(0, 20),
-          ['Aggregate', number(line.value[variable.length], 6)]]) }),
-      series: [
-        { type: 'parallel', data: values, lineStyle: { width: 1.2, opacity: 0.55 }, inactiveOpacity: 0.04, activeOpacity: 0.8,
-          emphasis: { lineStyle: { width: 2.5, opacity: 1 } } },
-        { type: 'parallel', data: values.slice(-1), z: 5, silent: true, lineStyle: { width: 3, opacity: 1, color: look.ink } },
-      ],
-    }),
+      good.length > places.length ? ` ${count(places.length)} of ${count(good.length)} lines are drawn.` : ''}`,
+    lines: {
+      axes: [...variable.map((parameter, index) => parameterAxis(parameter, parameters[index] ?? [])), { name: 'Aggregate', values: aggregate }],
+      places,
+      colouredBy: variable.length,
+      headline: (place) => `Evaluation ${count(numbers[place]!)}`,
+      thick: () => places.slice(-1),
+    },
     csv: () => ({
       columns: ['Evaluation', ...variable.map(({ name }) => name), 'Aggregate'].map((title) => ({ title })),
       length: good.length,
       row: (rank) => [count(numbers[good[rank]!]!), ...variable.map((_, index) => number(parameters[index]?.[good[rank]!])), number(aggregate[good[rank]!])],
     }),
-  };
+  });
 }
 
 function correlationPlan(data: ReportData, good: number[], name: string): ChartPlan {
@@ -266,7 +238,7 @@ export function goodSetsSection(data: ReportData): Section | null {
   return {
     id: 'good-sets',
     title: 'The best sets',
-    content: [chart(parallelPlan(data, good, name)), chart(correlationPlan(data, good, name))],
+    content: [chart(goodSetsPlan(data, good, name)), chart(correlationPlan(data, good, name))],
   };
 }
 

@@ -1,4 +1,4 @@
-import { make } from '../dom';
+import { make, shorten } from '../dom';
 
 export interface Section {
   id: string;
@@ -18,3 +18,16 @@ export function paragraph(text: string): HTMLElement {
 export function heading(text: string): HTMLElement {
   return make('h3', { title: text }, text);
 }
+
+/** A sentence on what was found: good, a warning, or neither. */
+export interface Finding {
+  text: string;
+  kind?: 'good' | 'warning';
+}
+
+export function findingList(all: Finding[]): HTMLElement {
+  return make('ul', { class: 'findings' }, ...all.map(({ text, kind }) => make('li', { class: kind }, text)));
+}
+
+/** A name in a sentence, isolated: one that is written from right to left does not turn the sentence around. */
+export const isolated = (name: string) => `\u2068${shorten(name, 60)}\u2069`;

@@ -102,7 +102,8 @@ const kAssumptions = [
   'The model, its input and its equations are right, and parameters that are left out or fixed are known exactly. The limits take no account of the bounds.',
 ];
 
-function covarianceContent(data: ReportData, covariance: Covariance, hasBetterFit: boolean): Node[] {
+/** The limits with what they assume, `ofSet` first: what is assumed of the set that they are of. */
+export function covarianceContent(data: ReportData, covariance: Covariance, ofSet: HTMLElement): Node[] {
   const columns = [{ title: 'Parameter' }, { title: 'Estimate', number: true }, { title: 'Standard deviation', number: true },
     { title: 'Lower limit', number: true }, { title: 'Upper limit', number: true }, { title: 'Deviation / estimate', number: true }];
   const rows = covariance.names.map((name, index) => {
@@ -113,10 +114,8 @@ function covarianceContent(data: ReportData, covariance: Covariance, hasBetterFi
   return [
     heading('Confidence limits'),
     paragraph('What the limits assume:'),
-    make('ul', {}, hasBetterFit
-      ? make('li', {}, 'The set is the one that fits best. ', make('strong', {}, 'It is not: a warning at the top says which fits better, and the limits mislead.'))
-      : make('li', {}, 'The set is the one that fits best: a better one elsewhere is not covered.'),
-    ...kAssumptions.map((text) => make('li', {}, text))),
+    make('ul', {}, ofSet, ...kAssumptions.map((text) => make('li', {}, text))),
+    ...(covariance.lagText ? [paragraph(`${covariance.lagText}.`)] : []),
     table(columns, rows, 'Confidence limits'),
     ...(covariance.leftOut.length > 0 ? [paragraph(`Left out: ${covariance.leftOut.map(({ name, reason }) => `\u2068${shorten(name, 60)}\u2069 (\u2068${reason}\u2069)`).join('; ')}.`)] : []),
     chart(confidencePlan(data, covariance)),
@@ -137,6 +136,9 @@ export function sensitivitySection(data: ReportData): Section | null {
     content.push(heading('Derivatives'), table([{ title: 'Parameter' }, ...outputs.map((title) => ({ title: shorten(title, 40), hint: title, number: true }))],
       parameters.map((name, index) => [name, ...outputs.map((_, column) => number(derivatives[index]?.[column]))]), 'Derivatives'));
   }
-  if (sensitivity.covariance) content.push(...covarianceContent(data, sensitivity.covariance, sensitivity.hasBetterFit ?? false));
+  const ofSet = sensitivity.hasBetterFit
+    ? make('li', {}, 'The set is the one that fits best. ', make('strong', {}, 'It is not: a warning at the top says which fits better, and the limits mislead.'))
+    : make('li', {}, 'The set is the one that fits best: a better one elsewhere is not covered.');
+  if (sensitivity.covariance) content.push(...covarianceContent(data, sensitivity.covariance, ofSet));
   return { id: 'sensitivity', title: 'Sensitivity', content };
 }

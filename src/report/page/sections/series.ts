@@ -60,7 +60,7 @@ export function outsidePeriod(look: Look, times: number[], period: Series['perio
 }
 
 /** A line and the dots on it; both have one entry in the legend. The library's sampling joins lines over gaps. */
-function drawnLine(name: string, line: Line, log: boolean, color: string, more: object): object[] {
+export function drawnLine(name: string, line: Line, log: boolean, color: string, more: object): object[] {
   const { dots } = line;
   const data = pointsOf(line, log);
   return [
@@ -71,10 +71,10 @@ function drawnLine(name: string, line: Line, log: boolean, color: string, more: 
 }
 
 /** In the legend. */
-const observedEntry = (isPoints: boolean) => (isPoints ? [{ name: 'observed', icon: 'circle' }] : lineEntries(['observed']));
+export const observedEntry = (isPoints: boolean) => (isPoints ? [{ name: 'observed', icon: 'circle' }] : lineEntries(['observed']));
 
 /** Whether zero belongs on the axis: not where it would press the values together, such as water levels. */
-const reachesZero = (columns: Maybe[][]) => {
+export const reachesZero = (columns: Maybe[][]) => {
   const all = columns.flatMap((values) => { const own = finite(values); return own.length > 0 ? [own.reduce((a, b) => Math.min(a, b)), own.reduce((a, b) => Math.max(a, b))] : []; });
   return Math.min(...all) < 0.7 * Math.max(...all);
 };

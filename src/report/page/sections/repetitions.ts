@@ -1,0 +1,203 @@
+// The same search with several seeds: how far its result depends on chance.
+import { axis, chart, legend, lineEntries, tip, tooltip, type ChartPlan } from '../chart';
+import { variableParameters, type Maybe, type Parameter, type Repetition, type Repetitions, type ReportData } from '../data';
+import { shorten, table } from '../dom';
+import { count, counted, number, percent } from '../format';
+import { bestSoFar, finite, placeBetweenBounds, quantile, sorted } from '../numbers';
+import { logRange } from '../ticks';
+import { findingList, heading, isolated, type Finding, type Section } from './section';
+
+const kNear = 0.01; // of the least value: as good as it
+const kApart = 0.1; // of the range between the bounds: another value of a parameter
+const kMostNamed = 12;
+const kMostRows = 60; // with a name each
+const kMostLines = 40;
+
+const nameOf = ({ seed, number: of }: Repetition) => `repetition ${of} (seed ${seed})`;
+const least = (all: readonly Repetition[]) => finite(all.map(({ aggregate }) => aggregate)).reduce((a, b) => Math.min(a, b), Infinity);
+
+/** Whether its best value is as good as the least of all. */
+const isNear = (one: Repetition, best: number) => one.aggregate !== null && one.aggregate - best <= kNear * Math.abs(best);
+
+/** The range of a parameter among the best sets of `some`, and its part of the range between the bounds. */
+interface Spread {
+  name: string;
+  low: number;
+  high: number;
+  share: number;
+}
+
+function spreads(data: ReportData, { parameters }: Repetitions, some: readonly Repetition[]): Spread[] {
+  const variable = variableParameters(data);
+  return parameters.flatMap((name, index) => {
+    const values = sorted(some.map((one) => one.parameters[index] ?? null));
+    const [low, high] = [values[0], values[values.length - 1]];
+    const [from, to] = [low, high].map((value) => (variable[index] && value !== undefined ? placeBetweenBounds(variable[index]!, value) : null));
+    return from == null || to == null ? [] : [{ name, low: low!, high: high!, share: to - from }];
+  }).sort((a, b) => b.share - a.share);
+}
+
+function listed<Item>(items: readonly Item[], text: (item: Item) => string): string {
+  const more = items.length - kMostNamed;
+  return `${items.slice(0, kMostNamed).map(text).join(', ')}${more > 0 ? ` and ${count(more)} more` : ''}`;
+}
+
+function findings(data: ReportData, repetitions: Repetitions): Finding[] {
+  const { all } = repetitions;
+  const values = sorted(all.map(({ aggregate }) => aggregate));
+  if (values.length === 0) return [{ kind: 'warning', text: 'No repetition has found a value.' }];
+  const best = values[0]!;
+  const near = all.filter((one) => isNear(one, best));
+  const isAgreed = 2 * near.length > all.length;
+  const found: Finding[] = [
+    { text: `The best aggregates of ${counted(all.length, 'repetition')}: least ${number(best, 6)}, median ${number(quantile(values, 0.5), 6)}, greatest ${number(values[values.length - 1], 6)}.` },
+    ...(all.length < 2 ? [] : [{ kind: isAgreed ? 'good' as const : 'warning' as const, text: `${count(near.length)} of ${counted(all.length, 'repetition')} ended within ${percent(kNear)} of the least value.${
+      isAgreed ? '' : ' What the search finds depends on the seed: a larger budget helps, or taking the best of several repetitions, as here.'}` }]),
+  ];
+  const [without, unfinished] = [all.length - values.length, all.filter(({ termination }) => termination === '').length];
+  if (without > 0) found.push({ kind: 'warning', text: `${counted(without, 'repetition')} found no value.` });
+  if (unfinished > 0) found.push({ kind: 'warning', text: `${counted(unfinished, 'repetition')} had not ended.` });
+  if (near.length < 2) return found;
+  const apart = spreads(data, repetitions, near).filter(({ share }) => share > kApart);
+  const text = (spread: Spread) => `${isolated(spread.name)} (${number(spread.low)} to ${number(spread.high)}, ${percent(spread.share, 2)} of its range)`;
+  found.push(apart.length > 0
+    ? { kind: 'warning', text: `These ${count(near.length)} agree in the value, but not in ${listed(apart, text)}: the observations hardly tell such values apart, and the parameter, or what makes up for it, is poorly identifiable.` }
+    : { kind: 'good', text: `These ${count(near.length)} agree in their parameters, too: each within ${percent(kApart)} of the range between its bounds.` });
+  return found;
+}
+
+interface Course {
+  one: Repetition;
+  places: number[]; // in the evaluations
+  best: Maybe[];
+}
+
+/** The best value so far of each repetition, over its own evaluations. */
+function coursesOf(data: ReportData, { all, stretches }: Repetitions): Course[] {
+  const { numbers, aggregate } = data.evaluations;
+  const placesOf = new Map<number, number[]>();
+  const ordered = [...stretches].sort((a, b) => a[1] - b[1]);
+  let next = 0;
+  numbers.forEach((evaluation, place) => {
+    while (next < ordered.length && ordered[next]![2] < evaluation) ++next;
+    const stretch = ordered[next];
+    if (!stretch || stretch[1] > evaluation) return;
+    const places = placesOf.get(stretch[0]) ?? placesOf.set(stretch[0], []).get(stretch[0])!;
+    places.push(place);
+  });
+  return all.flatMap((one) => {
+    const places = placesOf.get(one.number) ?? [];
+    const best = bestSoFar(places.map((place) => aggregate[place] ?? null));
+    return finite(best).length === 0 ? [] : [{ one, places, best }];
+  });
+}
+
+function coursePlan(courses: Course[]): ChartPlan {
+  const shown = courses.slice(0, kMostLines);
+  const values = finite(shown.flatMap(({ best }) => best));
+  const isLogable = values.every((value) => value > 0);
+  const longest = shown.reduce((most, { best }) => Math.max(most, best.length), 0);
+  const steps = ({ best }: Course) => best.flatMap((value, place) => (value !== null && (place === best.length - 1 || value !== best[place - 1]) ? [[place + 1, value]] : []));
+  return {
+    title: 'Best aggregate so far, by repetition',
+    note: `Over the evaluations of each repetition. Lines that end at one height say that the result does not depend on the seed.${shown.length < courses.length ? ` ${shown.length} of ${courses.length} are drawn.` : ''}`,
+    height: 360,
+    zoom: 'xy',
+    switches: isLogable ? [{ key: 'log', label: 'Log', on: true }] : [],
+    option: (look, is) => ({
+      legend: legend(look, { data: lineEntries(shown.map(({ one }) => nameOf(one))), itemWidth: 34 }),
+      grid: { left: 24, right: 16, top: 36, bottom: 28 },
+      xAxis: axis(look, { name: 'Evaluation of the repetition', min: 1, max: longest, minInterval: 1, nameGap: 26 }),
+      yAxis: axis(look, is('log') ? logRange([values]) : {}),
+      tooltip: tooltip(look, { trigger: 'axis', formatter: (points: { axisValue: number }[]) => {
+        const at = Math.round(points[0]!.axisValue);
+        return tip(`Up to evaluation ${count(at)}`, shown.slice(0, 16).map(({ one, best }) => [nameOf(one), number(best[Math.min(at, best.length) - 1], 5)]));
+      } }),
+      series: shown.map((course, index) => ({
+        name: nameOf(course.one), type: 'line', step: 'end', symbol: 'none', clip: true, color: look.many[index % look.many.length], data: steps(course),
+        lineStyle: { width: 1.8, type: (['solid', 'dashed', 'dotted'] as const)[Math.floor(index / look.many.length) % 3] },
+      })),
+    }),
+    csv: () => {
+      const rows = courses.flatMap(({ one, best }) => best.map((value, place) => [String(one.number), String(one.seed), String(place + 1), number(value)]));
+      return { columns: ['Repetition', 'Seed', 'Evaluation of the repetition', 'Best aggregate so far'].map((title) => ({ title })), length: rows.length, row: (place) => rows[place]! };
+    },
+  };
+}
+
+function bestPlan(all: Repetition[], best: number): ChartPlan {
+  const order = all.filter(({ aggregate }) => aggregate !== null).sort((a, b) => a.aggregate! - b.aggregate!);
+  const isNamed = order.length <= kMostRows;
+  return {
+    title: 'The best aggregate of each repetition',
+    note: `From the least to the greatest. Within the shaded part they are within ${percent(kNear)} of the least.`,
+    height: 56 + Math.max(6, Math.min(26, 900 / order.length)) * order.length,
+    switches: best > 0 ? [{ key: 'log', label: 'Log' }] : [],
+    option: (look, is) => ({
+      grid: { left: 24, right: 24, top: 4, bottom: 16 },
+      xAxis: axis(look, { ...(is('log') ? logRange([order.map(({ aggregate }) => aggregate)]) : { boundaryGap: ['3%', '3%'] }), ...(is('log') ? {} : { axisLabel: { showMinLabel: false, showMaxLabel: false } }) }),
+      yAxis: axis(look, { type: 'category', data: order.map(nameOf), inverse: true, axisTick: { show: false }, axisLabel: { show: isNamed, color: look.ink, interval: 0 } }),
+      tooltip: tooltip(look, { formatter: (dot: { value: [number, string] }) => tip(dot.value[1], [['best aggregate', number(dot.value[0], 6)]]) }),
+      series: [{
+        type: 'scatter', symbolSize: isNamed ? 9 : 5, data: order.map((one) => ({ value: [one.aggregate, nameOf(one)], itemStyle: { color: isNear(one, best) ? look.best : look.dots } })),
+        markArea: { silent: true, itemStyle: { color: look.band, opacity: 0.15 }, data: [[{ xAxis: best }, { xAxis: best + kNear * Math.abs(best) }]] },
+      }],
+    }),
+  };
+}
+
+/** The parameters of the best sets, between their bounds. */
+function parameterPlan(variable: Parameter[], { all, parameters }: Repetitions, best: number): ChartPlan {
+  const names = parameters;
+  const dots = (isOfNear: boolean) => names.flatMap((name, index) => all.filter((one) => isNear(one, best) === isOfNear).flatMap((one) => {
+    const place = variable[index] ? placeBetweenBounds(variable[index]!, one.parameters[index] ?? null) : null;
+    return place === null ? [] : [[100 * place, name, one.parameters[index]!, one.number]];
+  }));
+  const near = `within ${percent(kNear)} of the least`;
+  return {
+    title: 'The parameters of the best sets, between their bounds',
+    note: '0 % is the lower, 100 % the upper bound, on the scale of the search. Dots of one colour that lie apart say that other values of the parameter are as good.',
+    height: 90 + Math.max(14, Math.min(30, 900 / names.length)) * names.length,
+    option: (look) => ({
+      legend: legend(look, { data: [near, 'others'] }),
+      grid: { left: 24, right: 24, top: 36, bottom: 16 },
+      xAxis: axis(look, { min: 0, max: 100, axisLabel: { formatter: (value: number) => `${value} %` } }),
+      yAxis: axis(look, { type: 'category', data: names, inverse: true, axisTick: { show: false }, splitLine: { show: true, lineStyle: { color: look.rule } },
+        axisLabel: { color: look.ink, formatter: (name: string) => shorten(name, 24), interval: names.length > 40 ? 'auto' : 0 } }),
+      tooltip: tooltip(look, { formatter: (dot: { value: [number, string, number, number] }) => {
+        const one = all.find(({ number: of }) => of === dot.value[3])!;
+        return tip(nameOf(one), [[shorten(dot.value[1], 40), number(dot.value[2], 6)], ['best aggregate', number(one.aggregate, 6)]]);
+      } }),
+      series: [
+        { name: 'others', type: 'scatter', symbolSize: 8, itemStyle: { color: look.dots, opacity: 0.6 }, data: dots(false) },
+        { name: near, type: 'scatter', symbolSize: 9, z: 4, itemStyle: { color: look.best, opacity: 0.8 }, data: dots(true) },
+      ],
+    }),
+    values: () => ({
+      columns: [{ title: 'Repetition' }, ...['Seed', 'Best aggregate', ...names].map((title) => ({ title, number: true }))],
+      length: all.length,
+      row: (index) => [count(all[index]!.number), String(all[index]!.seed), number(all[index]!.aggregate, 6), ...names.map((_, place) => number(all[index]!.parameters[place], 6))],
+    }),
+  };
+}
+
+export function repetitionSection(data: ReportData): Section | null {
+  const { repetitions } = data;
+  if (!repetitions || repetitions.all.length === 0) return null;
+  const { all, parameters } = repetitions;
+  const best = least(all);
+  const courses = coursesOf(data, repetitions);
+  const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), number(one.aggregate, 6), count(one.best), one.termination ? count(one.loops) : '', one.termination || 'it had not ended']);
+  return {
+    id: 'repetitions',
+    title: 'The search with other seeds',
+    content: [
+      findingList(findings(data, repetitions)),
+      table([{ title: 'Repetition' }, { title: 'Seed', number: true }, { title: 'Evaluations', number: true }, { title: 'Best aggregate', number: true },
+        { title: 'Found by', number: true, hint: 'The evaluation' }, { title: 'Loops', number: true }, { title: 'Why it stopped' }], rows, 'Repetitions'),
+      ...(courses.length > 0 ? [heading('Courses'), chart(coursePlan(courses))] : []),
+      ...(Number.isFinite(best) && all.length > 1 ? [heading('Spread'), chart(bestPlan(all, best)),
+        ...(parameters.length > 0 ? [chart(parameterPlan(variableParameters(data), repetitions, best))] : [])] : []),
+    ],
+  };
+}

@@ -1,0 +1,67 @@
+#include "report/report_searches.h"
+
+#include <algorithm>
+#include <filesystem>
+#include <iterator>
+#include <string_view>
+#include <system_error>
+#include <vector>
+
+#include <fmt/format.h>
+
+#include "common/run_files.h"
+#include "measures/period_series.h"
+#include "report/report_analyses.h"
+#include "report/report_front.h"
+#include "report/report_repetitions.h"
+#include "run/results/series_table.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kByResiduals = "GLM";
+constexpr std::string_view kBySeveralObjectives[] = {"NSGA-II", "PADDS"};
+
+bool isThere(const std::string& filePrefix, const RunFile& file) {
+  std::error_code ignored;
+  return std::filesystem::exists(runFilePath(filePrefix, file), ignored);
+}
+
+bool hasSeveralObjectives(std::string_view algorithm) {
+  return std::find(std::begin(kBySeveralObjectives), std::end(kBySeveralObjectives), algorithm) !=
+         std::end(kBySeveralObjectives);
+}
+
+void addFront(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount, bool isExpected,
+              ReportData& data, std::vector<std::string>& faults) {
+  if (!isExpected && !isThere(filePrefix, run_files::kPareto)) return;
+  data.front = reportedFront(filePrefix, config.objectives.size(), variableCount, faults);
+  const std::vector<std::size_t> pairs = measuresOfDistinctPairs(config.measures);
+  if (!data.front || pairs.empty()) return;
+  std::vector<std::string> shown;
+  shown.reserve(pairs.size());
+  for (const std::size_t i : pairs) shown.push_back(pairName(config.measures, i));
+  std::string fault;
+  data.front->series = reportedFrontSeries(filePrefix, *data.front, seriesNames(config.measures, pairs), shown, fault);
+  if (!fault.empty()) faults.push_back(fault);
+}
+
+}  // namespace
+
+void addSearchTables(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount,
+                     ReportData& data) {
+  if (data.run.task != "optimisation") return;
+  const bool isFinished = data.run.stage == RunStage::finished;
+  std::vector<std::string> faults;
+  std::string fault;
+  data.estimate = reportedCovariance(filePrefix + "_Optimisation", fault);
+  if (!data.estimate && fault.empty() && isFinished && data.run.algorithm == kByResiduals) {
+    fault = fileNameOf(runFilePath(filePrefix, run_files::kEstimateLimits)) + " is not there";
+  }
+  if (!fault.empty()) faults.push_back(fmt::format("The limits of the parameters are not shown: {}", fault));
+  addFront(config, filePrefix, variableCount, isFinished && hasSeveralObjectives(data.run.algorithm), data, faults);
+  data.repetitions = reportedRepetitions(filePrefix, variableCount, faults);
+  for (const std::string& text : faults) data.run.notes.push_back(text + ".");
+}
+
+}  // namespace mirevo
