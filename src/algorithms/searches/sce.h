@@ -10,7 +10,8 @@ namespace mirevo {
 struct SceSettings {
   std::int32_t complexCount = 2;
   std::int32_t pointsPerComplex = 5;
-  std::int32_t evolutionSteps = 5;  ///< per complex and shuffling loop
+  std::int32_t evolutionSteps = 5;    ///< per complex and shuffling loop
+  bool usesPublishedFactors = false;  ///< a = 1 and c = 1/2, as in the paper
 };
 
 /// Shuffled Complex Evolution after Duan, Sorooshian and Gupta (1992), doi:10.1029/91WR02985, and (1993),
@@ -69,6 +70,8 @@ class Sce final : public PopulationSearch {
   void tryProposals(Proposal propose, Acceptance acceptance);
   ParameterSet firstProposal(const Complex& complex) { return complex.first; }
   ParameterSet secondProposal(const Complex& complex) { return complex.second; }
+  double reflectionLength() const;
+  double contractionLength() const;
   ParameterSet reflection(const Complex& complex);
   ParameterSet contraction(const Complex& complex);
   ParameterSet mutation(const Complex& complex);
