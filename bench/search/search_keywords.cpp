@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
-#include <iterator>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -151,16 +150,6 @@ void printValley() {
   }
 }
 
-/// Rugged functions in five dimensions, in which a Gaussian process takes a tenth of the time that it takes in ten.
-TestFunction ruggedFunctionNamed(const std::string& name) {
-  using testing::cube;
-  const TestFunction functions[] = {
-      cube("Griewank 5-D", 5, -600, 600, 0, 0.0, [](const auto& x) { return testing::griewank(x, 4000.0); }),
-      cube("Ackley 5-D", 5, -32.768, 32.768, 0, 0.0, testing::ackley)};
-  const auto found = std::ranges::find(functions, name, &TestFunction::name);
-  return found == std::end(functions) ? functionNamed(name) : *found;
-}
-
 /// By the interval of loops that are made without the surrogate model.
 void printChecks(SurrogateModelType model, const std::vector<int>& intervals, const std::vector<std::string>& names) {
   Header columns{"search", "alone"};
@@ -173,13 +162,13 @@ void printChecks(SurrogateModelType model, const std::vector<int>& intervals, co
     for (const Method method : {Method::sce, Method::pse}) {
       fmt::print("| {} | {} |", name, method == Method::sce ? "SCE" : "PSE");
       const Setting alone{.method = method, .complexes = 4, .budget = 6000, .stopsAtTarget = true};
-      printCell(successText(runTrials(ruggedFunctionNamed(name), alone, true, trials)));
+      printCell(successText(runTrials(functionNamed(name), alone, true, trials)));
       for (const int interval : intervals) {
         Setting setting = alone;
         setting.samplingRate = 25;
         setting.modelType = model;
         setting.checkInterval = interval;
-        printCell(successText(runTrials(ruggedFunctionNamed(name), setting, true, trials)));
+        printCell(successText(runTrials(functionNamed(name), setting, true, trials)));
       }
       fmt::print("\n");
     }

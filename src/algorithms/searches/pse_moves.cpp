@@ -17,8 +17,7 @@ constexpr double kMutationSpread = 0.9;
 /// contracts. With 1 it gets stuck in curved valleys; with 1.2 it misses optima in ten dimensions.
 constexpr double kReflectionLength = 1.1;
 
-/// Length of an expansion, in the same unit. Between 2 and 4 it makes little difference to populations in a bent
-/// valley; with 2 more optima of Griewank's function in ten dimensions are missed.
+/// Length of an expansion, in the same unit. Lengths from 2 to 5 make little difference, in bent valleys and elsewhere.
 constexpr double kExpansionLength = 3.0;
 
 /// How often a reflection is halved while it violates a constraint, before a mutation takes its place. With more, small
