@@ -17,10 +17,11 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   UniformGenerator random(seed);
   const SearchBounds bounds = testing::boundsOf(function);
   const int n = static_cast<int>(function.size());
-  const SurrogateSettings surrogate{.samplingRate = setting.samplingRate, .modelType = setting.modelType};
+  const SurrogateSettings surrogate{
+      .samplingRate = setting.samplingRate, .modelType = setting.modelType, .checkInterval = setting.checkInterval};
   ProposalSelector selector(surrogate, bounds);
   // The test of the change of the objective is switched off by a history that is never filled.
-  const StoppingCriteria stopping{setting.budget, 1000000000, 0.0};
+  const StoppingCriteria stopping{setting.budget, 1000000000, 0.0, setting.minPopulationRange};
   const SearchProblem problem{bounds,
                               stopping,
                               InitialSampleSettings{false, SampleGeneration::latinHypercube, ""},
@@ -31,13 +32,17 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   std::unique_ptr<SearchAlgorithm> search;
   if (setting.method == Method::sce) {
     const int points = n + 1 + (setting.extraPoints > 0 ? setting.extraPoints : n);
-    search = std::make_unique<Sce>(SceSettings{setting.complexes, points, points}, SimplexSettings{n + 1}, problem);
+    search = std::make_unique<Sce>(SceSettings{setting.complexes, points, points, setting.usesPublishedFactors},
+                                   SimplexSettings{n + 1}, problem);
   } else if (setting.method == Method::pse) {
-    search = std::make_unique<Pse>(PseSettings{setting.complexes * (2 * n + 1)}, SimplexSettings{n + 1}, problem);
+    const PseSettings pse{.populationSize = setting.complexes * (2 * n + 1), .expansionShare = setting.expansionShare};
+    search = std::make_unique<Pse>(pse, SimplexSettings{n + 1}, problem);
   } else if (setting.method == Method::opse) {
     const int points = setting.complexes * (2 * n + 1);
     const int inFlight = std::max(1, static_cast<int>(setting.inFlight * points));
-    search = std::make_unique<Opse>(OpseSettings{{points}, inFlight}, SimplexSettings{n + 1}, problem);
+    search = std::make_unique<Opse>(
+        OpseSettings{{.populationSize = points, .expansionShare = setting.expansionShare}, inFlight},
+        SimplexSettings{n + 1}, problem);
   } else if (setting.method == Method::cma) {
     search = std::make_unique<CmaEs>(setting.cma, problem);
   } else {
@@ -53,7 +58,7 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   }
   // With noise what counts is what the chosen set is really worth.
   const double best = setting.noise > 0.0 ? function.value(search->summary().best) : evaluator.bestInTime;
-  return {evaluator.hasHitTarget(), evaluator.evaluationsToTarget, best};
+  return {evaluator.hasHitTarget(), evaluator.evaluationsToTarget, best, evaluator.evaluations};
 }
 
 std::vector<Outcome> runTrials(const std::function<TestFunction(int)>& functionOf, const Setting& setting, int trials) {

@@ -32,8 +32,12 @@ struct Setting {
   int samplingRate = 100;  ///< per cent; below 100 with the surrogate model
   SurrogateModelType modelType = SurrogateModelType::quadraticPolynomial;
   bool stopsAtTarget = false;
-  int extraPoints = 0;               ///< points per complex beyond n + 1; 0 means n, that is 2n + 1 points
-  double inFlight = 0.5;             ///< of OPSE, sets for each point of the population
+  int extraPoints = 0;                ///< points per complex beyond n + 1; 0 means n, that is 2n + 1 points
+  bool usesPublishedFactors = false;  ///< of SCE
+  double inFlight = 0.5;              ///< of OPSE, sets for each point of the population
+  double expansionShare = 0.0;        ///< of PSE and OPSE
+  int checkInterval = 0;              ///< of the surrogate model
+  double minPopulationRange = StoppingCriteria().minPopulationRange;
   bool goesOnWhenConverged = false;  ///< until the budget is used up, whatever the stopping tests say
   DdsSettings dds = {};
   CmaEsSettings cma = {};
@@ -46,6 +50,7 @@ struct Outcome {
   bool isSuccess = false;
   int evaluations = 0;  ///< until the first value within the tolerance of the optimum
   double best = 0.0;    ///< without noise, and found within the time
+  int evaluationsMade = 0;
 };
 
 /// Evaluates a function; counts the evaluations and records when a value is first within the tolerance of the optimum.

@@ -76,6 +76,7 @@ constexpr PseRefusals OpseMethod::kRefusals{
     .simplex = "Error: No. of points in a simplex in OPSE algorithm invalid",
     .reflection = "Error: Probability for reflection step in OPSE algorithm invalid",
     .contraction = "Error: Probability for contraction step in OPSE algorithm invalid",
+    .expansion = "Error: Probability for expansion step in OPSE algorithm invalid",
     .sum = "Error: Sum of probabilities for reflection and contraction in OPSE algorithm larger than 1"};
 
 const SearchFacts& OpseMethod::facts() const {

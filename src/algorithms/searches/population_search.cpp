@@ -52,6 +52,7 @@ SearchStatus PopulationSearch::advance() {
   noteLoop();
   stopping_.update(population_.front().value(), summary_.evaluationCount, summary_.populationRange);
   summary_.terminationMessage = stopping_.message();
+  summary_.notes = stopping_.reasons();
   if (!isTerminated() || submittedCount_ == 0) return kSearchOk;
   finish();
   sortBestFirst(population_);

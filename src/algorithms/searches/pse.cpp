@@ -64,6 +64,7 @@ constexpr PseRefusals PseMethod::kRefusals{
     .simplex = "Error: No. of points in a simplex in PSE algorithm invalid",
     .reflection = "Error: Probability for reflection step in PSE algorithm invalid",
     .contraction = "Error: Probability for contraction step in PSE algorithm invalid",
+    .expansion = "Error: Probability for expansion step in PSE algorithm invalid",
     .sum = "Error: Sum of probabilities for reflection and contraction in PSE algorithm larger than 1"};
 
 const SearchFacts& PseMethod::facts() const {

@@ -22,6 +22,7 @@ struct PseRefusals {
   std::string_view simplex;
   std::string_view reflection;
   std::string_view contraction;
+  std::string_view expansion;
   std::string_view sum;  ///< of the two probabilities
 };
 
@@ -66,7 +67,14 @@ std::vector<KeywordRow> pseKeywordRows() {
             if (r + c <= 1.0) return std::nullopt;
             return SettingRefusal{std::string(Method::kRefusals.sum), kContractionKeyword,
                                   fmt::format("expected at most 1 with Prob_Reflection, found {} + {}", r, c)};
-          })};
+          }),
+      setting<Method>([](auto& m) -> auto& { return m.settings.expansionShare; },
+                      {.name = "Prob_Expansion",
+                       .defaultValue = "0",
+                       .range = kFraction,
+                       .refusal = Method::kRefusals.expansion,
+                       .meaning = "Probability that a reflection goes nearly three times as far; 0.2 keeps the "
+                                  "population spread along bent valleys."})};
 }
 
 /// Settings that are small for n parameters: a population or a simplex that spans too few directions.

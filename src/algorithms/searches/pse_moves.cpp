@@ -17,6 +17,9 @@ constexpr double kMutationSpread = 0.9;
 /// contracts. With 1 it gets stuck in curved valleys; with 1.2 it misses optima in ten dimensions.
 constexpr double kReflectionLength = 1.1;
 
+/// Length of an expansion, in the same unit. Lengths from 2 to 5 make little difference, in bent valleys and elsewhere.
+constexpr double kExpansionLength = 3.0;
+
 /// How often a reflection is halved while it violates a constraint, before a mutation takes its place. With more, small
 /// populations collapse on the constraint.
 constexpr int kReflectionHalvings = 1;
@@ -33,7 +36,7 @@ bool PseMoves::areSettingsValid() const {
   const double r = settings_.reflectionProbability;
   const double c = settings_.contractionProbability;
   return settings_.populationSize >= 1 && simplex_.pointCount >= 2 && simplex_.pointCount <= settings_.populationSize &&
-         r >= 0.0 && c >= 0.0 && r + c <= 1.0;
+         r >= 0.0 && c >= 0.0 && r + c <= 1.0 && settings_.expansionShare >= 0.0 && settings_.expansionShare <= 1.0;
 }
 
 /// The parents of a generation, best first, so that a budget cuts off the offspring of the worst. The best points have
@@ -89,11 +92,18 @@ PseMoves::Offspring PseMoves::makeOffspring(std::size_t parent) {
 }
 
 ParameterSet PseMoves::reflection(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g) {
-  const ParameterSet& u = population_[parent].set;
-  ParameterSet point = pointOnRay(g, u, -kReflectionLength * reflectionFactor(bounds().size()));
-  const std::optional<ParameterSet> drawn =
-      isWithinBounds(point) ? shortened(std::move(point), g, kReflectionHalvings) : std::nullopt;
-  return drawn ? *drawn : mutation(parent, others, g);
+  std::optional<ParameterSet> point;
+  // Without expansions no number is drawn, so that settings without them give what they always gave.
+  const bool isExpansion = settings_.expansionShare > 0.0 && draw() < settings_.expansionShare;
+  if (isExpansion) point = rayPoint(parent, g, kExpansionLength);
+  if (!point) point = rayPoint(parent, g, kReflectionLength);
+  return point ? *point : mutation(parent, others, g);
+}
+
+/// The reflection of that length; empty outside the bounds and the constraints.
+std::optional<ParameterSet> PseMoves::rayPoint(std::size_t parent, std::span<const double> g, double length) {
+  ParameterSet point = pointOnRay(g, population_[parent].set, -length * reflectionFactor(bounds().size()));
+  return isWithinBounds(point) ? shortened(std::move(point), g, kReflectionHalvings) : std::nullopt;
 }
 
 ParameterSet PseMoves::mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g) {

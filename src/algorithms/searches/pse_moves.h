@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <span>
 #include <vector>
 
@@ -15,6 +16,7 @@ struct PseSettings {
   double reflectionProbability = 0.7;   ///< of the move that is due, at first a reflection
   double contractionProbability = 0.0;  ///< of an immediate contraction; the remainder to 1 is that of an immediate
                                         ///< mutation
+  double expansionShare = 0.0;          ///< of the reflections those that are expansions
 };
 
 /// The moves of Population Simplex Evolution: how a point of the population gets an offspring, and what becomes of it.
@@ -28,11 +30,14 @@ struct PseSettings {
 ///   accepted even if worse: u is stuck.
 /// A mutation that is due is made. Otherwise the reflection or contraction that is due is made with
 /// `reflectionProbability`, an immediate contraction with `contractionProbability`, and an immediate mutation with the
-/// remaining probability. The offspring replaces u if it is better. A new point begins a step. A mutation is normally
-/// distributed about g, independently in every parameter, which restores the directions that the linear moves lose. It
-/// also replaces a reflection outside the bounds. A reflection that violates a constraint is halved once, and then a
-/// mutation replaces it; a contraction is drawn back towards g, or u if g violates one, too; a mutation is drawn again.
-/// c is that of SCE, a is 1.1 times that of SCE. What the alternatives cost is measured in docs/algorithms/pse.md.
+/// remaining probability. Of the reflections a share of `expansionShare` goes farther, as the expansion of Nelder and
+/// Mead (1965), doi:10.1093/comjnl/7.4.308, does, but without a reflection before it; one outside the bounds or the
+/// constraints is a reflection after all. The offspring replaces u if it is better. A new point begins a step. A
+/// mutation is normally distributed about g, independently in every parameter, which restores the directions that the
+/// linear moves lose. It also replaces a reflection outside the bounds. A reflection that violates a constraint is
+/// halved once, and then a mutation replaces it; a contraction is drawn back towards g, or u if g violates one, too; a
+/// mutation is drawn again. c is that of SCE, a is 1.1 times that of SCE. What the alternatives cost is measured in
+/// docs/algorithms/pse.md.
 class PseMoves : public PopulationSearch {
  protected:
   struct Offspring {
@@ -60,6 +65,7 @@ class PseMoves : public PopulationSearch {
 
   std::vector<std::size_t> drawOthers(std::size_t parent);
   ParameterSet reflection(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
+  std::optional<ParameterSet> rayPoint(std::size_t parent, std::span<const double> g, double length);
   ParameterSet mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
   ParameterSet drawMutation(std::span<const std::size_t> simplex, const Box& box, std::span<const double> g);
 

@@ -124,10 +124,18 @@ void Sce::tryProposals(Proposal propose, Acceptance acceptance) {
   }
 }
 
+double Sce::reflectionLength() const {
+  return settings_.usesPublishedFactors ? 1.0 : reflectionFactor(bounds().size());
+}
+
+double Sce::contractionLength() const {
+  return settings_.usesPublishedFactors ? 0.5 : contractionFactor(bounds().size());
+}
+
 ParameterSet Sce::reflection(const Complex& complex) {
   const std::vector<double>& g = complex.current.centroid;
   const ParameterSet& u = complex.points[complex.current.worst].set;
-  ParameterSet point = pointOnRay(g, u, -reflectionFactor(bounds().size()));
+  ParameterSet point = pointOnRay(g, u, -reflectionLength());
   const std::optional<ParameterSet> drawn =
       isWithinBounds(point) ? shortened(std::move(point), g, kReflectionHalvings) : std::nullopt;
   return drawn ? *drawn : randomPoint(complex);
@@ -136,7 +144,7 @@ ParameterSet Sce::reflection(const Complex& complex) {
 ParameterSet Sce::contraction(const Complex& complex) {
   const std::vector<double>& g = complex.current.centroid;
   const ParameterSet& u = complex.points[complex.current.worst].set;
-  return drawnBack(clampedToBounds(pointOnRay(g, u, contractionFactor(bounds().size()))), {g, u});
+  return drawnBack(clampedToBounds(pointOnRay(g, u, contractionLength())), {g, u});
 }
 
 ParameterSet Sce::mutation(const Complex& complex) {
@@ -191,7 +199,13 @@ BoundSection SceMethod::section() {
                            {.name = "No_Evaluation_Steps",
                             .range = from(1),
                             .refusal = "Error: No. of evaluation steps in SCE algorithm invalid",
-                            .meaning = "Evolution steps of a complex between two shuffles; 2n + 1 is usual."})}}};
+                            .meaning = "Evolution steps of a complex between two shuffles; 2n + 1 is usual."}),
+        setting<SceMethod>([](auto& m) -> auto& { return m.settings.usesPublishedFactors; },
+                           {.name = "Published_Factors",
+                            .defaultValue = "0",
+                            .meaning = "Whether reflections and contractions are as long as in the papers. They are "
+                                       "shorter otherwise, which takes fewer model runs and with 2 complexes misses a "
+                                       "few more optima among many."})}}};
   return {section, *this};
 }
 

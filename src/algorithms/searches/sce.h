@@ -10,7 +10,8 @@ namespace mirevo {
 struct SceSettings {
   std::int32_t complexCount = 2;
   std::int32_t pointsPerComplex = 5;
-  std::int32_t evolutionSteps = 5;  ///< per complex and shuffling loop
+  std::int32_t evolutionSteps = 5;    ///< per complex and shuffling loop
+  bool usesPublishedFactors = false;  ///< a = 1 and c = 1/2, as in the paper
 };
 
 /// Shuffled Complex Evolution after Duan, Sorooshian and Gupta (1992), doi:10.1029/91WR02985, and (1993),
@@ -25,13 +26,13 @@ struct SceSettings {
 ///   complex, always accepted unless its evaluation failed.
 /// A reflection that violates a constraint is halved, at most twice, and then a random point replaces it; a contraction
 /// is drawn back towards g, or u if g violates one, too; a random point is drawn again. The paper has a = 1 and c =
-/// 1/2. Here a = 0.75 + 0.5/n (at most 1) and c = 0.45 − 0.1/n, which needs about a seventh fewer evaluations on the
-/// test functions (docs/algorithms/sce.md). With a surrogate model a complex looks at reflections and contractions of
-/// several subcomplexes, runs the most promising one first and its counterpart next, and of several random points runs
-/// the most promising. In every step the complex that holds the best point of the loop first proposes the point where
-/// the model predicts the lowest value around its own best point. Complexes are independent of each other between two
-/// shuffles and advance together: the batch of a step holds the current proposal of every complex. Points, values and
-/// random numbers do not depend on how the batch is run.
+/// 1/2, which can be selected. Here a = 0.75 + 0.5/n (at most 1) and c = 0.45 − 0.1/n, which needs about a seventh
+/// fewer evaluations on the test functions (docs/algorithms/sce.md). With a surrogate model a complex looks at
+/// reflections and contractions of several subcomplexes, runs the most promising one first and its counterpart next,
+/// and of several random points runs the most promising. In every step the complex that holds the best point of the
+/// loop first proposes the point where the model predicts the lowest value around its own best point. Complexes are
+/// independent of each other between two shuffles and advance together: the batch of a step holds the current proposal
+/// of every complex. Points, values and random numbers do not depend on how the batch is run.
 class Sce final : public PopulationSearch {
  public:
   Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -69,6 +70,8 @@ class Sce final : public PopulationSearch {
   void tryProposals(Proposal propose, Acceptance acceptance);
   ParameterSet firstProposal(const Complex& complex) { return complex.first; }
   ParameterSet secondProposal(const Complex& complex) { return complex.second; }
+  double reflectionLength() const;
+  double contractionLength() const;
   ParameterSet reflection(const Complex& complex);
   ParameterSet contraction(const Complex& complex);
   ParameterSet mutation(const Complex& complex);

@@ -3,7 +3,16 @@
 #include <algorithm>
 #include <cmath>
 
+#include <fmt/format.h>
+
+#include "common/text.h"
+
 namespace mirevo {
+namespace {
+
+constexpr std::string_view kChangeKeyword = "Min_Change";
+
+}  // namespace
 
 const SettingSection<StoppingCriteria>& stoppingSection() {
   static const SettingSection<StoppingCriteria> section{
@@ -23,11 +32,19 @@ const SettingSection<StoppingCriteria>& stoppingSection() {
              .unit = "loops",
              .meaning = "Number of loops over which the change of the best objective value is evaluated."}),
         setting<&StoppingCriteria::minChange>(
-            {.name = "Min_Change",
+            {.name = kChangeKeyword,
              .defaultValue = "0.001",
              .range = kNonNegative,
              .refusal = "Error: Minimum change convergence criterion invalid",
-             .meaning = "Relative change of the best objective value below which the search has converged."})}}};
+             .meaning = "Relative change of the best objective value below which the search has converged."}),
+        setting<&StoppingCriteria::minPopulationRange>(
+            {.name = kRangeKeyword,
+             .defaultValue = "1e-5",
+             .range = kFraction,
+             .refusal = "Error: Minimum population range convergence criterion invalid",
+             .unit = "of the bounds",
+             .meaning = "Of SCE, PSE and OPSE: range of the population, as a mean over the parameters, below which it "
+                        "has converged. 0: it never has."})}}};
   return section;
 }
 
@@ -45,15 +62,30 @@ void StoppingTests::update(double bestValue, int evaluationCount, double populat
     relativeChange_ = 2.0 * std::abs(earlier - bestValue) / (bestValue + earlier);
   }
 
+  populationRange_ = populationRange;
   if (evaluationCount >= criteria_.maxEvaluations) {
     message_ = kBudgetUsedMessage;
   }
-  if (criteria_.minChange > relativeChange_) {
+  if (isChangeSmall()) {
     message_ = "Optimisation terminated: Objective function convergence criterion met";
   }
-  if (kConvergedPopulationRange > populationRange) {
+  if (isRangeSmall()) {
     message_ = "Optimisation terminated: Population converged";
   }
+}
+
+std::vector<std::string> StoppingTests::reasons() const {
+  std::vector<std::string> lines;
+  if (isChangeSmall()) {
+    lines.push_back(fmt::format("Relative change of the best objective value over {} loops: {:.6g}, less than {} = {}",
+                                criteria_.loopsConvergence, relativeChange_, kChangeKeyword,
+                                formatReal(criteria_.minChange)));
+  }
+  if (isRangeSmall()) {
+    lines.push_back(fmt::format("Range of the population, of the bounds: {:.6g}, less than {} = {}",
+                                populationRange_, kRangeKeyword, formatReal(criteria_.minPopulationRange)));
+  }
+  return lines;
 }
 
 }  // namespace mirevo

@@ -2,7 +2,10 @@
 
 #include <cstdint>
 #include <deque>
+#include <limits>
+#include <string>
 #include <string_view>
+#include <vector>
 
 #include "common/settings/keyword_row.h"
 
@@ -14,18 +17,18 @@ struct StoppingCriteria {
   std::int32_t loopsConvergence = 10;  ///< loops over which the best objective value is compared
   double minChange = 0.001;            ///< relative change of the best objective value below which the search has
                                        ///< converged
+  double minPopulationRange = 1.0e-5;  ///< normalisedPopulationRange() below which a population has converged
 };
 
 /// The keyword of `maxEvaluations`.
 inline constexpr std::string_view kBudgetKeyword = "Max_No_Evaluations";
+/// The keyword of `minPopulationRange`.
+inline constexpr std::string_view kRangeKeyword = "Min_Population_Range";
 /// Why a search stops that has used its budget up.
 inline constexpr std::string_view kBudgetUsedMessage =
     "Optimisation terminated: Maximum number of model evaluations reached";
 /// The section STOPPING_CRITERIA.
 const SettingSection<StoppingCriteria>& stoppingSection();
-
-/// The normalised population range below which a population has converged. Fixed, not a setting.
-inline constexpr double kConvergedPopulationRange = 1.0e-5;
 
 /// The three tests that end a population search, all made after every loop. If several are met, the last gives the
 /// message.
@@ -40,14 +43,20 @@ class StoppingTests final {
   bool isMet() const { return !message_.empty(); }
   /// Why the search stops; empty while it goes on.
   std::string_view message() const { return message_; }
+  /// Of the tests of the change and of the range those that are met, one line each with the value and its limit.
+  std::vector<std::string> reasons() const;
   /// 2·|H − f| / (f + H), where f is the best value and H the best value `loopsConvergence` − 1 loops earlier. Until
   /// there is such a loop it is twice `minChange`, so that the search cannot count as converged.
   double relativeChange() const { return relativeChange_; }
 
  private:
+  bool isChangeSmall() const { return criteria_.minChange > relativeChange_; }
+  bool isRangeSmall() const { return criteria_.minPopulationRange > populationRange_; }
+
   StoppingCriteria criteria_;
   std::deque<double> history_;  ///< best value of each of the last `loopsConvergence` loops, newest first
   double relativeChange_;
+  double populationRange_ = std::numeric_limits<double>::infinity();
   std::string_view message_;
 };
 

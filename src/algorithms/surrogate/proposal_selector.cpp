@@ -31,6 +31,8 @@ constexpr double kMadeAgain = std::numeric_limits<double>::infinity();
 constexpr CodeName kModelNames[] = {{0, "quadratic polynomial"}, {1, "Gaussian process"}};
 constexpr std::string_view kNeighbourhoodKeyword = "Neighbourhood_Size";
 constexpr std::string_view kGenerationsKeyword = "No_Initial_Generations";
+constexpr std::string_view kCheckKeyword = "Check_Interval";
+constexpr std::string_view kCheckRefusal = "Error: Invalid check interval for surrogate modelling optimisation";
 constexpr std::string_view kNeighbourhoodRefusal =
     "Error: Invalid neighbourhood size for surrogate modelling optimisation";
 
@@ -109,7 +111,21 @@ const SettingSection<SurrogateSection>& surrogateSection() {
              .unit = "loops",
              .meaning = "Number of initial loops without the surrogate; together with the initial sample they must "
                         "provide at least `Neighbourhood_Size` evaluated sets, if that is given.",
-             .checkOrder = 3})}}};
+             .checkOrder = 3}),
+        checked<Section>(setting<Section>([](auto& s) -> auto& { return s.surrogate.checkInterval; },
+                                          {.name = kCheckKeyword,
+                                           .defaultValue = "0",
+                                           .range = from(0),
+                                           .refusal = kCheckRefusal,
+                                           .unit = "loops",
+                                           .meaning = "After the initial loops every so many-th loop is made without "
+                                                      "the surrogate. 0: none; otherwise at least 2.",
+                                           .checkOrder = 4}),
+                         [](const Section& s) -> std::optional<SettingRefusal> {
+                           if (s.surrogate.checkInterval != 1) return std::nullopt;
+                           return SettingRefusal{std::string(kCheckRefusal), kCheckKeyword,
+                                                 "expected 0, or at least 2: with 1 the surrogate is never used"};
+                         })}}};
   return section;
 }
 
@@ -204,7 +220,9 @@ void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& res
 }
 
 bool ProposalSelector::isActive(int loop) const {
-  return loop >= settings_.initialGenerations && points_.size() >= leastSetCount(settings_, bounds_.size());
+  const int past = loop - settings_.initialGenerations;
+  const bool isCheck = settings_.checkInterval > 0 && past % settings_.checkInterval == settings_.checkInterval - 1;
+  return past >= 0 && !isCheck && points_.size() >= leastSetCount(settings_, bounds_.size());
 }
 
 std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& point) const {

@@ -29,6 +29,7 @@ struct SurrogateSettings {
   std::int32_t neighbourhoodSize = 0;  ///< 0: determined by model type and number of parameters
   SurrogateModelType modelType = SurrogateModelType::gaussianProcess;
   std::int32_t initialGenerations = 1;  ///< loops evaluated by the model alone
+  std::int32_t checkInterval = 0;       ///< after them every so many-th loop is, too; 0: none
 };
 /// The section SURROGATE_MODEL_PARAMETERS, and the number of parameters of the model.
 struct SurrogateSection {

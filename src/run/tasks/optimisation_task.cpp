@@ -384,6 +384,10 @@ void OptimisationTask::readStopping(const SetupSection& section, std::size_t var
   }
   section.check(bound);
   warnOfOneLoop(section);
+  if (section.isWritten(kRangeKeyword) && !method->testsPopulationRange()) {
+    section.warn(kRangeKeyword,
+                 fmt::format("has no effect: {} does not test the range of a population", method->facts().longName));
+  }
   const std::int64_t population = method->populationSize();
   if (const auto tooMany = tooManySets(std::min<std::int64_t>(population, stopping.maxEvaluations), variableCount)) {
     section.refuse("Error: Unable to allocate memory in MIREVO setup", kBudgetKeyword,
@@ -452,9 +456,10 @@ std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space
   }
   if (!usesSurrogate()) return lines;
   lines.push_back(fmt::format(
-      "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}",
+      "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}{}",
       surrogateModelName(surrogate), neighbourhoodSize(surrogate, space.size()), proposalsPerRun(surrogate),
-      surrogate.initialGenerations));
+      surrogate.initialGenerations,
+      surrogate.checkInterval > 0 ? fmt::format(", then one in {}", surrogate.checkInterval) : ""));
   return lines;
 }
 

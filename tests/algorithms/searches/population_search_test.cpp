@@ -141,6 +141,25 @@ TEST_P(EitherSearch, StopsWhereNoParameterCanVary) {
             "Optimisation terminated: Population converged");
 }
 
+TEST_P(EitherSearch, GoesOnUntilThePopulationIsAsNarrowAsTheSettingSays) {
+  const auto sphere = [](const ParameterSet& x) { return resultOf(1.0 + x[0] * x[0] + x[1] * x[1]); };
+  std::vector<int> evaluations;
+  for (const double limit : {1.0e-2, 1.0e-5, 1.0e-7, 0.0}) {
+    FunctionEvaluator evaluator(sphere);
+    UniformGenerator random(1);
+    const StoppingCriteria stopping{4000, 1000000, 0.0, limit};
+    const SearchBounds bounds{{-3, -3}, {5, 5}, {0, 0}};
+    const SearchSummary summary = runToEnd(*makeSearch(GetParam(), 2, {bounds, stopping, {}, {}, evaluator, random}));
+    evaluations.push_back(summary.evaluationCount);
+    if (limit == 0.0) break;
+    EXPECT_LT(summary.populationRange, limit);
+    EXPECT_EQ(summary.terminationMessage, "Optimisation terminated: Population converged");
+    EXPECT_THAT(summary.notes, ElementsAre(::testing::HasSubstr("less than Min_Population_Range = ")));
+  }
+  EXPECT_TRUE(std::ranges::is_sorted(evaluations, std::ranges::less_equal{})) << ::testing::PrintToString(evaluations);
+  EXPECT_EQ(evaluations.back(), 4000);
+}
+
 TEST_P(EitherSearch, RefusesStepsAndSettingsThatMakeNoSense) {
   FunctionEvaluator evaluator([](const ParameterSet&) { return resultOf(1.0); });
   UniformGenerator random(1);
@@ -218,18 +237,21 @@ TEST(Sce, ReflectsTheWorstPointOfTheSubcomplexFirst) {
 }
 
 TEST(Sce, ContractsWhereTheReflectionIsNoBetterAndElseTakesARandomPoint) {
-  // Every new point is worse than the three of the sample.
-  FunctionEvaluator counting([&](const ParameterSet&) { return resultOf(counting.evaluationCount + 1); });
-  UniformGenerator random(1);
-  Sce sce({1, 3, 1}, {3}, fromThreePoints(counting, random));
-  advanceBy(sce, 1);
-  ASSERT_EQ(counting.batches.size(), 4U);
-  EXPECT_THAT(counting.batches[1][0], ElementsAre(6, 3));
-  // g + 0.4·(u − g)
-  EXPECT_THAT(counting.batches[2][0], ElementsAre(DoubleEq(5.3), DoubleEq(5.8)));
-  EXPECT_EQ(sce.population().back().set, counting.batches[3][0]);
-  EXPECT_THAT(counting.batches[3][0],
-              ElementsAre(AllOf(::testing::Ge(5), ::testing::Le(6)), AllOf(::testing::Ge(5), ::testing::Le(7))));
+  for (const bool isPublished : {false, true}) {
+    // Every new point is worse than the three of the sample.
+    FunctionEvaluator counting([&](const ParameterSet&) { return resultOf(counting.evaluationCount + 1); });
+    UniformGenerator random(1);
+    Sce sce({1, 3, 1, isPublished}, {3}, fromThreePoints(counting, random));
+    advanceBy(sce, 1);
+    ASSERT_EQ(counting.batches.size(), 4U);
+    EXPECT_THAT(counting.batches[1][0], ElementsAre(6, 3));
+    // g + c·(u − g)
+    const double c = isPublished ? 0.5 : 0.4;
+    EXPECT_THAT(counting.batches[2][0], ElementsAre(DoubleEq(5.5 - 0.5 * c), DoubleEq(5 + 2 * c)));
+    EXPECT_EQ(sce.population().back().set, counting.batches[3][0]);
+    EXPECT_THAT(counting.batches[3][0],
+                ElementsAre(AllOf(::testing::Ge(5), ::testing::Le(6)), AllOf(::testing::Ge(5), ::testing::Le(7))));
+  }
 }
 
 TEST(Sce, RunsOneProposalOfEveryComplexAtATime) {
@@ -269,6 +291,44 @@ TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
   }
   EXPECT_THAT(pse.population().back().set, Not(ElementsAre(5, 7)));
   EXPECT_THAT(pse.population().front().set, ElementsAre(5, 5));
+}
+
+TEST(Pse, GoesFartherInAnExpansionUnlessThatIsOutside) {
+  struct Case {
+    double lower;
+    ParameterSet expected;
+  };
+  const Case cases[] = {{-20.0, {5.5 + 3 * 0.5, 5 - 3 * 2}}, {0.0, {5.5 + 1.1 * 0.5, 5 - 1.1 * 2}}};
+  for (const Case& c : cases) {
+    FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(x[0] + x[1]); });
+    UniformGenerator random(1);
+    SearchProblem problem = fromThreePoints(evaluator, random);
+    problem.bounds.lower = {c.lower, c.lower};
+    Pse pse({3, 1.0, 0.0, 1.0}, {3}, problem);
+    advanceBy(pse, 1);
+    EXPECT_THAT(evaluator.batches[1].back(), ::testing::Pointwise(DoubleEq(), c.expected)) << c.lower;
+  }
+}
+
+/// In four dimensions, where the population is caught in the bend of the valley without expansions.
+TEST(Pse, FollowsABentValleyWithExpansions) {
+  std::map<double, int> successes;  // of fifteen seeds, by the share of expansions
+  for (const double share : {0.0, 0.2}) {
+    for (int seed = 1; seed <= 15; ++seed) {
+      FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
+      UniformGenerator random(seed);
+      Pse pse({36, 0.7, 0.0, share}, {5},
+              {{ParameterSet(4, -5.0), ParameterSet(4, 5.0), ParameterSet(4, 0.0)},
+               onBudget(4000),
+               {},
+               {},
+               evaluator,
+               random});
+      successes[share] += runToEnd(pse).bestResult.aggregate < 1.0e-3 ? 1 : 0;
+    }
+  }
+  EXPECT_GE(successes[0.2], 14);
+  EXPECT_LE(successes[0.0], 12);
 }
 
 /// A failed mutation between its moves does not let a point begin again: it is reflected in one generation at most.

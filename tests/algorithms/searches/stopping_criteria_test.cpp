@@ -5,6 +5,7 @@
 #include <tuple>
 #include <vector>
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 namespace mirevo {
@@ -30,6 +31,8 @@ TEST(StoppingTests, StopWithTheMessageOfTheLastTestThatHolds) {
       {"two zeros have no relative change", {100, 2, 0.1}, {{0, 1, 1, ""}, {0, 2, 1, ""}}},
       {"not a number never converges", {100, 2, 0.1}, {{NAN, 1, 1, ""}, {NAN, 2, 1, ""}}},
       {"range at the threshold", {100, 10, 0.0}, {{1, 1, 1.0e-5, ""}, {1, 2, 0.99e-5, kPopulation}}},
+      {"range at a threshold of its own", {100, 10, 0.0, 1.0e-3}, {{1, 1, 1.0e-3, ""}, {1, 2, 0.99e-3, kPopulation}}},
+      {"no range without a threshold", {100, 10, 0.0, 0.0}, {{1, 1, 0.0, ""}, {1, 100, 0.0, kBudget}}},
       {"budget and population", {100, 10, 0.0}, {{1, 100, 0.0, kPopulation}}},
       {"budget and objective", {3, 3, 0.5}, {{1, 1, 1, ""}, {1, 2, 1, ""}, {1, 3, 1, kObjective}}},
       {"the oldest entry is dropped", {100, 2, 0.5}, {{9, 1, 1, ""}, {1, 2, 1, ""}, {0.9, 3, 1, kObjective}}},
@@ -43,6 +46,18 @@ TEST(StoppingTests, StopWithTheMessageOfTheLastTestThatHolds) {
       EXPECT_EQ(tests.message(), message) << name << ", evaluation " << evaluations;
     }
   }
+}
+
+TEST(StoppingTests, SayWhichLimitIsMet) {
+  StoppingTests tests({100, 2, 0.25, 1.0e-3});
+  tests.update(3.0, 1, 0.5);
+  EXPECT_THAT(tests.reasons(), ::testing::IsEmpty());
+  tests.update(2.5, 2, 2.5e-4);  // 2·0.5/5.5
+  EXPECT_THAT(tests.reasons(),
+              ::testing::ElementsAre(
+                  ::testing::MatchesRegex("Relative change of the best objective value over 2 loops: 0\\.1818.*, "
+                                          "less than Min_Change = 0\\.25"),
+                  "Range of the population, of the bounds: 0.00025, less than Min_Population_Range = 0.001"));
 }
 
 }  // namespace

@@ -155,6 +155,18 @@ TEST(ProposalSelector, RanksByPredictionAndLeavesFailuresOut) {
   }
 }
 
+TEST(ProposalSelector, LeavesEveryNthLoopAfterTheInitialOnesToTheModel) {
+  for (const auto& [interval, expected] : {std::pair{0, "--SSSSSSS"}, {2, "--S-S-S-S"}, {3, "--SS-SS-S"}}) {
+    const SurrogateSettings settings{
+        .modelType = SurrogateModelType::quadraticPolynomial, .initialGenerations = 2, .checkInterval = interval};
+    ProposalSelector selector(settings, {{0}, {1}, {0}});
+    for (const double x : {0.0, 0.3, 0.9}) selector.note({x}, resultOf(x));
+    std::string loops;
+    for (int loop = 0; loop < 9; ++loop) loops += selector.isActive(loop) ? 'S' : '-';
+    EXPECT_EQ(loops, expected);
+  }
+}
+
 TEST(ProposalSelector, FindsTheModelsMinimumInItsNeighbourhoodOnce) {
   const SearchBounds bounds{{-10, 3, -10}, {10, 3, 10}, {0, 3, 0}};
   const auto at = [](double x, double y) {

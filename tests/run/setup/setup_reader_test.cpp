@@ -369,6 +369,10 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"No_Points_Simplex = 5 => 2", "No_Points_Simplex: found 2, at least 3 are advised"},
       {"No_Loops_Convergence = 12 => 1", "No_Loops_Convergence: with 1 the search ends after its first loop, use at"},
       {"No_Loops_Convergence = 12 => 1 & Min_Change = 0.005 => 0", ""},
+      {"Min_Change = 0.005 => Min_Change = 0.005\nMin_Population_Range = 1e-8", ""},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1 & Min_Change = 0.005 => "
+       "Min_Change = 0.005\nMin_Population_Range = 1e-8",
+       "Min_Population_Range: has no effect: Dynamically Dimensioned Search does not test the range of a population"},
       {"Algorithm_Type = 1 => 0", ""},
       {"Algorithm_Type = 1 => 0 & No_Points_Complex = 7 => 4 & No_Points_Subcomplex = 6 => 2",
        "No_Points_Complex: found 4, at least 5 are advised"},
