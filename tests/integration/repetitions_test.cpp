@@ -168,7 +168,11 @@ TEST_F(Repeated, ASetupIsCheckedWithItsRepetitions) {
       {{}, 2, "Repetition_Order = 'at once'", "'side by side'"},
       {{.search = "GLM"}, 2, "", "expected 1 for GLM, found 2: its Starts begin at several sets of one sample"},
       {{.maxEvaluations = 1500000000}, 2, "", "expected at most 1073741823 for Repetitions = 2, found 1500000000"},
-      {{.slots = 2}, 2, "", "expected 1 with this Algorithm_Type, found 2"},
+      {{.slots = 2},
+       2,
+       "",
+       "expected 1 with this Algorithm_Type, found 2; several model runs at a time: Repetition_Order = 'side by "
+       "side', "},
       {{.slots = 2}, 1, kSideBySide, "expected 1 with this Algorithm_Type, found 2"}};
   for (const auto& [settings, count, order, reason] : refused) {
     writeSetup(settings, count, order);

@@ -82,9 +82,9 @@ class SpreadText final {
     if (near_.size() < 2) return lines;
     if (!wide.empty()) {
       lines.push_back(fmt::format(
-          "At nearly equal values these parameters take up much of their ranges, so that the calibration identifies "
-          "them poorly: {}",
-          wide));
+          "At nearly equal values these parameters take up more than {:g} % of their ranges, so that the calibration "
+          "identifies them poorly: {}",
+          100.0 * kWideShare, wide));
     } else if (isSameEachTime()) {
       lines.push_back(fmt::format(
           "Whatever the seed, the search ended at nearly the same value, with every parameter within {:g} % of its "
@@ -100,7 +100,7 @@ class SpreadText final {
   std::vector<std::string> parameterTable() const {
     std::vector<std::string> headings{"least", "median", "greatest", "% of range"};
     const bool showsNear = near_.size() > 1 && !isSameEachTime();
-    if (showsNear) headings.push_back(fmt::format("of the {} least", near_.size()));
+    if (showsNear) headings.push_back(fmt::format("% ({} least)", near_.size()));
     std::vector<std::vector<double>> rows;
     for (std::size_t k = 0; k < space_.size(); ++k) {
       std::vector<double> values;
@@ -134,7 +134,7 @@ class SpreadText final {
     std::ranges::stable_sort(wide, [](const auto& a, const auto& b) { return a.first > b.first; });
     std::string text;
     for (std::size_t i = 0; i < std::min(wide.size(), kMostNamed); ++i) {
-      text += fmt::format("{}{} ({:.0f} %)", i == 0 ? "" : ", ", space_.names[wide[i].second], 100.0 * wide[i].first);
+      text += fmt::format("{}{} ({:.3g} %)", i == 0 ? "" : ", ", space_.names[wide[i].second], 100.0 * wide[i].first);
     }
     if (wide.size() > kMostNamed) text += fmt::format(" and {} more", wide.size() - kMostNamed);
     return text;

@@ -479,8 +479,10 @@ std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space
 
 std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
   if (method->facts().runsInParallel || repetitions.areSideBySide()) return std::nullopt;
+  const std::string order =
+      repetitions.count > 1 ? fmt::format("{} = 'side by side', ", kRepetitionOrderKeyword) : std::string();
   return OneSlotOnly{"Error: Use Population Simplex Evolution algorithm for application with multiple processors",
-                     kAlgorithmKeyword, waysToRunSeveral()};
+                     kAlgorithmKeyword, order + waysToRunSeveral()};
 }
 
 int OptimisationTask::mostAtOnce() const {
@@ -523,8 +525,9 @@ SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasib
 void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
   const bool drawsAnySet = !feasibility.isTested() && initialSample.generation != SampleGeneration::fromFile;
   const bool isSearch = surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
-  if (drawsAnySet || !isSearch || !earlierSearches_.empty()) return;  // a search that is continued had begun
-  for (std::int32_t i = 0; i < repetitions.count; ++i) {
+  if (drawsAnySet || !isSearch || !earlierSearches_.empty()) return;            // a search that is continued had begun
+  const std::int32_t samples = feasibility.isTested() ? repetitions.count : 1;  // otherwise all are alike
+  for (std::int32_t i = 0; i < samples; ++i) {
     UniformGenerator random(repetitionSeed(randomSeed, i));
     NoModel evaluator;
     method->make(problemOf(space, feasibility, evaluator, random))->initialise();
