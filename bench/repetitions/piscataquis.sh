@@ -1,7 +1,6 @@
 #!/usr/bin/env bash
-# What five repetitions of a search say of examples/piscataquis: DDS with a small and with a larger budget, side by side,
-# and SCE. Prints what the log says of the repetitions. The figures in docs/repetitions.md come from here; about 8,000 model
-# runs.
+# What five repetitions of DDS, side by side, say of examples/piscataquis, with a small and with a larger budget. Prints what
+# the log says of the repetitions. The figures in docs/repetitions.md come from here; about 3,000 model runs.
 #
 #   bench/repetitions/piscataquis.sh [build folder [NAME]...]   all names without one
 set -euo pipefail
@@ -21,7 +20,7 @@ repeat() {
     $1 == "Max_No_Evaluations" { print "Max_No_Evaluations =", budget; next }
     $1 == "NoSimultaneousSim" { print "NoSimultaneousSim = 2"; next }
     { print }' piscataquis.kdx >"$1.kdx"
-  "$build/Mirevo" "$1.kdx" 2>/dev/null
+  "$build/Mirevo" "$1.kdx"
   printf '\n%s\n' "$1"
   sed -n '/^The 5 repetitions/,/^$/p' "$1.log"
   grep '^The .* were busy\|^[0-9]* model evaluations' "$1.log"
@@ -29,4 +28,3 @@ repeat() {
 repeated="Repetitions = 5;Repetition_Order = 'side by side'"
 repeat DDS_100 "Algorithm_Type = 'DDS';$repeated" 100
 repeat DDS_500 "Algorithm_Type = 'DDS';$repeated" 500
-repeat SCE_1000 "Algorithm_Type = 'SCE';$repeated;[SCE_CONTROL_PARAMETERS];No_Complexes = 4;[/SCE_CONTROL_PARAMETERS]" 1000

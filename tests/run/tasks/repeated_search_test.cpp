@@ -10,7 +10,7 @@
 namespace mirevo {
 namespace {
 
-constexpr int kBudget = 70;
+constexpr int kRepeatedBudget = 70;
 
 class RepeatedSearches : public ::testing::Test {
  protected:
@@ -20,7 +20,7 @@ class RepeatedSearches : public ::testing::Test {
     task->method = searchMethods().make(SetupValue(std::string(search)));
     task->method->setVariableCount(2);
     task->surrogateUse = use;
-    task->stopping = {.maxEvaluations = kBudget, .minChange = 0.02};
+    task->stopping = {.maxEvaluations = kRepeatedBudget, .minChange = 0.02};
     task->surrogate.neighbourhoodSize = 20;
     task->repetitions = settings;
     task->randomSeed = seed;
@@ -56,7 +56,7 @@ TEST_F(RepeatedSearches, EachFindsWhatARunWithItsSeedFindsInEitherOrder) {
       SCOPED_TRACE(::testing::Message() << name.name << " " << static_cast<int>(use));
       const auto consecutive = taskOf(name.name, use, {3, RepetitionOrder::consecutive}, 5);
       if (use == SurrogateUse::yes && !consecutive->method->facts().usesSurrogate) continue;
-      EXPECT_EQ(consecutive->plannedEvaluations(), 3 * kBudget);
+      EXPECT_EQ(consecutive->plannedEvaluations(), 3 * kRepeatedBudget);
       const TaskOutcome outcome = run(*consecutive);
       const auto rows = rowsOf(outcome);
       ASSERT_EQ(rows.size(), 3U);
