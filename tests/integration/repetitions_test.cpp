@@ -11,7 +11,7 @@
 namespace mirevo::testing {
 namespace {
 
-constexpr const char* kSideBySide = "Repetition_Order = 'side by side'";
+constexpr const char* kInSideBySideOrder = "Repetition_Order = 'side by side'";
 /// Searches that are made several times.
 class Repeated : public ::testing::Test {
  protected:
@@ -51,10 +51,10 @@ class Repeated : public ::testing::Test {
 
 TEST_F(Repeated, AnyNumberOfSlotsOrRanksMakesTheSameFiles) {
   const std::tuple<RunSettings, std::string, std::vector<int>, int> cases[] = {
-      {{.maxEvaluations = 10}, kSideBySide, {2, 3}, 4},
-      {{.algorithm = 0, .includesInitial = false, .aggregation = 1, .maxEvaluations = 16}, kSideBySide, {3}, 0},
-      {{.search = "PDDS", .maxEvaluations = 12}, kSideBySide, {4}, 0},
-      {{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 30}, kSideBySide, {3}, 0},
+      {{.maxEvaluations = 10}, kInSideBySideOrder, {2, 3}, 4},
+      {{.algorithm = 0, .includesInitial = false, .aggregation = 1, .maxEvaluations = 16}, kInSideBySideOrder, {3}, 0},
+      {{.search = "PDDS", .maxEvaluations = 12}, kInSideBySideOrder, {4}, 0},
+      {{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 30}, kInSideBySideOrder, {3}, 0},
       {{.algorithm = 1, .maxEvaluations = 14}, "", {3}, 3},
   };
   folder_.useScript(kSleepByParameters);
@@ -78,7 +78,7 @@ TEST_F(Repeated, AnyNumberOfSlotsOrRanksMakesTheSameFiles) {
 }
 
 TEST_F(Repeated, ARunThatWasCutOffAnywhereGoesOnToTheSameFiles) {
-  for (const std::string order : {"", kSideBySide}) {
+  for (const std::string order : {"", kInSideBySideOrder}) {
     removeResults();
     writeSetup({.algorithm = 0, .includesInitial = false, .maxEvaluations = 20, .restart = 1}, 3, order);
     runToEnd();
@@ -114,7 +114,7 @@ TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
   const std::tuple<RunSettings, int, std::string, const char*> refused[] = {
       {raised, 3, "", "Max_No_Evaluations: 20 then, 30 now: it holds for each of 3 repetitions"},
       {settings, 2, "", "Repetitions of OPTIMISATION_ALGORITHM: 3 then, 2 now"},
-      {settings, 4, kSideBySide, "Repetition_Order of OPTIMISATION_ALGORITHM: absent then, 'side by side' now"}};
+      {settings, 4, kInSideBySideOrder, "Repetition_Order of OPTIMISATION_ALGORITHM: absent then, 'side by side' now"}};
   const auto before = results();
   for (const auto& [other, count, order, reason] : refused) {
     writeSetup(other, count, order);
@@ -123,9 +123,9 @@ TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
     EXPECT_EQ(results(), before);
   }
   removeResults();
-  writeSetup(settings, 2, kSideBySide);
+  writeSetup(settings, 2, kInSideBySideOrder);
   runToEnd();
-  writeSetup(settings, 3, kSideBySide);
+  writeSetup(settings, 3, kInSideBySideOrder);
   EXPECT_EQ(run().exitCode, 1);
   EXPECT_THAT(log(), HasSubstr("Repetitions of OPTIMISATION_ALGORITHM: 2 then, 3 now"));
 }
@@ -133,7 +133,7 @@ TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
 TEST_F(Repeated, WhatEndsARunLeavesTheRepetitionsAsFarAsTheyHadCome) {
   // After 12 model runs each waits for the one that cancels, or fails.
   const std::string counted = "n=1; while ! mkdir ../tickets/$n; do n=$((n + 1)); done 2>/dev/null\n";
-  for (const std::string order : {"", kSideBySide}) {
+  for (const std::string order : {"", kInSideBySideOrder}) {
     for (const bool fails : {false, true}) {
       removeResults();
       std::filesystem::remove_all(folder_ / "tickets");
@@ -173,19 +173,19 @@ TEST_F(Repeated, ASetupIsCheckedWithItsRepetitions) {
        "",
        "expected 1 with this Algorithm_Type, found 2; several model runs at a time: Repetition_Order = 'side by "
        "side', "},
-      {{.slots = 2}, 1, kSideBySide, "expected 1 with this Algorithm_Type, found 2"}};
+      {{.slots = 2}, 1, kInSideBySideOrder, "expected 1 with this Algorithm_Type, found 2"}};
   for (const auto& [settings, count, order, reason] : refused) {
     writeSetup(settings, count, order);
     const ProgramResult result = runProgram({"--check", setup_});
     EXPECT_EQ(result.exitCode, 1);
     EXPECT_THAT(result.output + result.error, HasSubstr(reason)) << count << order;
   }
-  writeSetup({.maxEvaluations = 25, .slots = 8}, 4, kSideBySide);
+  writeSetup({.maxEvaluations = 25, .slots = 8}, 4, kInSideBySideOrder);
   const ProgramResult result = runProgram({"--check", setup_});
   EXPECT_EQ(result.exitCode, 0) << result.error;
   EXPECT_THAT(result.output, HasSubstr("Dynamically Dimensioned Search, 4 repetitions\nPlanned model runs: 101\n"));
   EXPECT_THAT(result.output + result.error, HasSubstr("only 4 can be used by the evaluations of this run"));
-  writeSetup({}, 1, kSideBySide);
+  writeSetup({}, 1, kInSideBySideOrder);
   EXPECT_THAT(runProgram({"--check", setup_}).output, HasSubstr("has no effect with Repetitions = 1"));
 }
 

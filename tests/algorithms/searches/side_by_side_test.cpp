@@ -53,7 +53,7 @@ class NotingEvaluator final : public Evaluator {
 };
 
 /// A batch of `size` sets `rounds` times, numbered from 10 times `name` on.
-SearchRun batches(int name, int size, int rounds, int* unwound = nullptr) {
+SearchRun batchSearch(int name, int size, int rounds, int* unwound = nullptr) {
   return [=](Evaluator& evaluator, const PeriodicStep& step) {
     static int ignored = 0;
     const Unwound mark{unwound == nullptr ? ignored : *unwound};
@@ -91,7 +91,7 @@ TEST(SideBySide, EachGoesOnAsSoonAsItHasItsResultsWhichComeInTheOrderOfTheSets) 
   std::string lines;
   std::string ends;
   runSideBySide(
-      evaluator, {batches(1, 1, 3), batches(2, 2, 2), window, none},
+      evaluator, {batchSearch(1, 1, 3), batchSearch(2, 2, 2), window, none},
       [&](std::string_view line) { lines += fmt::format("{} ", line); },
       [&](std::size_t search, const SearchSummary& summary) {
         ends += fmt::format("{}:{} ", search, summary.evaluationCount);
@@ -124,8 +124,8 @@ TEST(SideBySide, WhateverEndsARunAllSearchesAreUnwound) {
     int unwound = 0;
     NotingEvaluator evaluator;
     evaluator.failsAt = failsAt;
-    const std::vector<SearchRun> searches{batches(1, 1, 4, &unwound), batches(2, 2, 2, &unwound),
-                                          batches(3, 1, 4, &unwound)};
+    const std::vector<SearchRun> searches{batchSearch(1, 1, 4, &unwound), batchSearch(2, 2, 2, &unwound),
+                                          batchSearch(3, 1, 4, &unwound)};
     EXPECT_THROW(runSideBySide(evaluator, searches, silent, ignored), RunCancelled);
     EXPECT_EQ(evaluator.taken, failsAt);
     EXPECT_EQ(unwound, 3) << failsAt;
@@ -145,14 +145,14 @@ TEST(SideBySide, WhateverEndsARunAllSearchesAreUnwound) {
     inner.evaluateParameterSets(sets, DispatchMode::task);
     fatalError("its own");
   };
-  const SearchRun endless = batches(5, 1, 1000000, &unwound);
+  const SearchRun endless = batchSearch(5, 1, 1000000, &unwound);
   const PeriodicStep fullDisk = [](std::string_view) { fatalError("disk full"); };
   const SearchEnd failsAtEnd = [](std::size_t, const SearchSummary&) { fatalError("at the end"); };
   for (const auto& [searches, step, end, wanted] :
        {std::tuple(std::vector{settling, endless}, silent, ignored, "no scale"),
         std::tuple(std::vector{endless, failing}, silent, ignored, "its own"),
         std::tuple(std::vector{endless, endless}, fullDisk, ignored, "disk full"),
-        std::tuple(std::vector{batches(1, 1, 2, &unwound), endless}, silent, failsAtEnd, "at the end")}) {
+        std::tuple(std::vector{batchSearch(1, 1, 2, &unwound), endless}, silent, failsAtEnd, "at the end")}) {
     unwound = 0;
     NotingEvaluator evaluator;
     evaluator.settlingFails = true;
