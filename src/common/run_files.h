@@ -91,8 +91,11 @@ inline constexpr RunFile kEstimateCovariance{"_Optimisation_Covariance", ".dat",
 inline constexpr RunFile kEstimateCorrelation{"_Optimisation_Correlation", ".dat", false, true};
 inline constexpr RunFile kEstimateLimits{"_Optimisation_ParameterLimits", ".dat", false, true};
 inline constexpr RunFile kEstimateJacobian{"_Optimisation_Jacobian", ".dat", false, true};
-inline constexpr std::array kEstimateTables{kEstimateCovariance, kEstimateCorrelation, kEstimateLimits,
-                                            kEstimateJacobian};
+/// Those of a search that is repeated.
+inline constexpr RunFile kRepetitions{"_Optimisation_Repetitions", ".dat"};
+inline constexpr RunFile kRepetitionRows{"_Optimisation_RepetitionRows", ".dat"};
+inline constexpr std::array kSearchTables{kEstimateCovariance, kEstimateCorrelation, kEstimateLimits,
+                                          kEstimateJacobian,   kRepetitions,         kRepetitionRows};
 
 /// Those of a search by several objectives.
 inline constexpr RunFile kPareto{"_Pareto", ".dat", false, true};
@@ -128,7 +131,7 @@ inline constexpr ResultFileNames kSensitivity{
 inline constexpr ResultFileNames kOptimisation{
     {"_Optimisation", ".dat"},           restartFile("_Optimisation_Restart"), simulatedFile("_Optimisation_Simulated"),
     {"_Optimisation_Run", ".dat"},       {"_Optimisation_Failures", ".dat"},   {"_Optimisation_Pairs", ".dat"},
-    {"_Optimisation_Checksums", ".dat"}, {"_Optimisation_NotKept", ".dat"},    kEstimateTables};
+    {"_Optimisation_Checksums", ".dat"}, {"_Optimisation_NotKept", ".dat"},    kSearchTables};
 
 inline constexpr std::string_view kFailuresMark = "# Failed evaluations of ";
 /// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another

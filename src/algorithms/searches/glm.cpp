@@ -472,7 +472,8 @@ const SearchFacts& GlmMethod::facts() const {
                                       .runsInParallel = true,
                                       .drawsInitialSample = true,
                                       .needsRanges = true,
-                                      .usesResiduals = true};
+                                      .usesResiduals = true,
+                                      .whyNotRepeated = "its Starts begin at several sets of one sample"};
   return kFacts;
 }
 

@@ -29,6 +29,7 @@ struct SearchFacts {
   /// Of a search that does not fill several slots: what a job of several processes runs at once all the same.
   std::string_view runsAtOnceUnderMpi = {};
   std::string_view populationKeywords = {};  ///< "Population_Size"; empty if it has no population
+  std::string_view whyNotRepeated = {};      ///< why repetitions of it are refused; empty if they are not
 };
 
 /// A keyword whose value is small for the number of variable parameters: the search may end early.
@@ -49,6 +50,8 @@ struct SearchHistory {
   int budget = 0;                       ///< Max_No_Evaluations then
   int evaluations = 0;                  ///< completed without a gap from the first one on
   std::vector<EarlierSearch> searches;  ///< the searches that it continued
+  int repetitions = 1;                  ///< Repetitions then
+  int lastRow = 0;                      ///< the highest number of an evaluation
 };
 
 /// What becomes of an earlier search when its budget is raised.

@@ -82,8 +82,8 @@ int reap(pid_t process) {
 
 }  // namespace
 
-// Without exec: the helper is there at once and needs no file. The program has no threads of its own; those of an MPI
-// library hold no lock that the helper needs, as the C library's are in order after a fork.
+// Without exec: the helper is there at once and needs no file. The threads of searches side by side wait
+// meanwhile; those of an MPI library hold no lock that the helper needs, as the C library's are in order after a fork.
 bool HelperProcess::start(const std::function<void(int)>& serve, std::string& reason) {
   end();
   wasKilled_ = false;

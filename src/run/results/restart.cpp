@@ -131,8 +131,9 @@ int lastWithoutGap(const ResultRows& rows) {
 }
 
 /// Applies what the search does with an earlier one that had a smaller budget.
-void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
-  const auto raised = task.raisedBudget({earlierBudget, lastWithoutGap(run.rows), run.searches});
+void raiseBudget(const Task& task, int earlierBudget, int repetitions, EarlierRun& run) {
+  const int lastRow = run.rows.empty() ? 0 : run.rows.number(run.rows.size() - 1);
+  const auto raised = task.raisedBudget({earlierBudget, lastWithoutGap(run.rows), run.searches, repetitions, lastRow});
   if (!raised) return;
   if (!raised->refusal.empty()) refuse(raised->refusal);
   run.rows.keepIf([&](std::size_t i) { return run.rows.number(i) <= raised->keptEvaluations; });
@@ -198,7 +199,7 @@ std::optional<EarlierRun> earlierRunIn(std::string text, const RestartFiles& fil
   }
   if (config.restart == RestartMode::goOnAndRepeatFailed) dropFailuresAtEnd(run);
   const auto earlierBudget = searchBudget(then);
-  if (earlierBudget && config.task) raiseBudget(*config.task, *earlierBudget, run);
+  if (earlierBudget && config.task) raiseBudget(*config.task, *earlierBudget, searchRepetitions(then), run);
   return run;
 }
 

@@ -18,6 +18,7 @@
 #include "common/text.h"
 #include "common/version.h"
 #include "run/access/setup_schema.h"
+#include "run/tasks/repeated_search.h"
 
 namespace mirevo {
 namespace {
@@ -124,6 +125,16 @@ bool isBudget(const RestartSettings& settings, const ResultSetting& setting) {
   });
 }
 
+/// Whether further repetitions of a search follow those that were to be made; where they go on side by side, they would
+/// stand among them.
+bool addsRepetitions(const RestartSettings& then, const RestartSettings& now) {
+  return searchRepetitions(now) > searchRepetitions(then) &&
+         std::ranges::none_of(now.settings, [](const ResultSetting& setting) {
+           return setting.keyword == kRepetitionOrderKeyword &&
+                  setting.value == fmt::format("'{}'", repetitionOrderNames()[1].name);
+         });
+}
+
 /// A section for messages: "PARAMETER_3 (X3)" if the item has a name, else its whole path.
 std::string shownSection(const SettingIndex& index, std::string_view section) {
   std::size_t start = 0;
@@ -200,6 +211,13 @@ std::optional<int> searchBudget(const RestartSettings& settings) {
   return std::nullopt;
 }
 
+int searchRepetitions(const RestartSettings& settings) {
+  for (const ResultSetting& setting : settings.settings) {
+    if (setting.keyword == kRepetitionsKeyword) return parseInteger(setting.value).value_or(1);
+  }
+  return 1;
+}
+
 std::vector<std::string> changedSettings(const RestartSettings& then, const RestartSettings& now) {
   const std::vector<SettingKey> keysThen = keysOf(then);
   const std::vector<SettingKey> keysNow = keysOf(now);
@@ -212,8 +230,10 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
   const auto earlierBudget = searchBudget(then);
   const auto budget = searchBudget(now);
   const bool isRaised = budget && earlierBudget && *budget > *earlierBudget;
+  const bool hasMoreRepetitions = addsRepetitions(then, now);
   for (std::size_t i = 0; i < keysNow.size(); ++i) {
     const ResultSetting& setting = now.settings[i];
+    if (hasMoreRepetitions && setting.keyword == kRepetitionsKeyword) continue;
     const auto found = before.find(keysNow[i]);
     if (found == before.end()) {
       // An earlier version that did not know the keyword worked like its default.

@@ -45,5 +45,7 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
 
 /// The budget of a search or of Markov chains; empty for another task.
 std::optional<int> searchBudget(const RestartSettings& settings);
+/// The number of its repetitions; 1 of one that is not repeated.
+int searchRepetitions(const RestartSettings& settings);
 
 }  // namespace mirevo

@@ -55,7 +55,23 @@ const SettingSection<OptimisationTask>& optimisationSection() {
              .defaultValue = "0",
              .codes = kNoYesNames,
              .meaning = fmt::format("0 no, 1 yes; for {}. Any other number runs no search.",
-                                    searchesWith(&SearchFacts::usesSurrogate, "and"))})}}};
+                                    searchesWith(&SearchFacts::usesSurrogate, "and"))}),
+        setting<OptimisationTask>(
+            [](auto& t) -> auto& { return t.repetitions.count; },
+            {.name = kRepetitionsKeyword,
+             .defaultValue = "1",
+             .range = between(1, kMostRepetitions),
+             .refusal = "Error: No. of repetitions of the search invalid",
+             .unit = "searches",
+             .meaning = "How many times the search is made, with Random_Seed and the seeds that follow it. "
+                        "Max_No_Evaluations holds for each. The log compares what they have found."}),
+        choice<OptimisationTask>(
+            [](OptimisationTask& task, const SetupValue& value) { takeRepetitionOrder(task.repetitions, value); },
+            {.name = kRepetitionOrderKeyword,
+             .defaultValue = kNoDefault,
+             .codes = repetitionOrderNames(),
+             .meaning = "One repetition after the other, or all at the same time, which fills slots by searches that "
+                        "propose one set at a time. Each finds the same either way. Without it, consecutive."})}}};
   return section;
 }
 
@@ -213,6 +229,7 @@ void OptimisationTask::read(const TaskReading& reading) {
     section.warn(kSurrogateKeyword, "neither 0 nor 1, no search will be run");
   }
   readMethod(reading, section);
+  requireRepetitions(repetitions, method->facts(), section);
 
   const SetupSection sample = section.open(nameInside(initialSampleSection().row));
   InitialSampleSection filled{initialSample, randomSeed};
@@ -383,6 +400,7 @@ void OptimisationTask::readStopping(const SetupSection& section, std::size_t var
     section.refuse(refusal, kBudgetKeyword, fmt::format("expected 1 or more, found {}", stopping.maxEvaluations));
   }
   section.check(bound);
+  requireRepeatedBudget(repetitions, stopping, section);
   warnOfOneLoop(section);
   if (section.isWritten(kRangeKeyword) && !method->testsPopulationRange()) {
     section.warn(kRangeKeyword,
@@ -442,8 +460,9 @@ void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSect
 }
 
 std::string OptimisationTask::description() const {
-  return fmt::format("Parameter optimisation: {}{}", method->facts().longName,
-                     usesSurrogate() ? " with surrogate model" : "");
+  return fmt::format("Parameter optimisation: {}{}{}", method->facts().longName,
+                     usesSurrogate() ? " with surrogate model" : "",
+                     repetitions.count > 1 ? fmt::format(", {} repetitions", repetitions.count) : "");
 }
 
 std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space) const {
@@ -454,6 +473,7 @@ std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space
                                 initialSample.earlierOrder == EarlierOrder::best ? "the best" : "the first",
                                 countText(earlierSets_.successCount, "successful evaluation")));
   }
+  if (repetitions.count > 1) lines.push_back(repetitionsText(repetitions, stopping, randomSeed));
   if (!usesSurrogate()) return lines;
   lines.push_back(fmt::format(
       "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}{}",
@@ -464,13 +484,20 @@ std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space
 }
 
 std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
-  if (method->facts().runsInParallel) return std::nullopt;
+  if (method->facts().runsInParallel || repetitions.areSideBySide()) return std::nullopt;
+  const std::string order =
+      repetitions.count > 1 ? fmt::format("{} = 'side by side', ", kRepetitionOrderKeyword) : std::string();
   return OneSlotOnly{"Error: Use Population Simplex Evolution algorithm for application with multiple processors",
-                     kAlgorithmKeyword, waysToRunSeveral()};
+                     kAlgorithmKeyword, order + waysToRunSeveral()};
 }
 
 int OptimisationTask::mostAtOnce() const {
-  const std::int64_t most = method->mostAtOnce();
+  std::int64_t most = method->mostAtOnce();
+  if (repetitions.areSideBySide()) {
+    const SearchFacts& facts = method->facts();
+    if (most == 0 && !facts.runsInParallel && facts.runsAtOnceUnderMpi.empty()) most = 1;
+    most *= repetitions.count;
+  }
   return most == 0 ? plannedEvaluations() : static_cast<int>(std::min<std::int64_t>(most, plannedEvaluations()));
 }
 
@@ -513,22 +540,60 @@ SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasib
 void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
   const bool drawsAnySet = !feasibility.isTested() && initialSample.generation != SampleGeneration::fromFile;
   const bool isSearch = surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
-  if (drawsAnySet || !isSearch || !earlierSearches_.empty()) return;  // a search that is continued had begun
-  UniformGenerator random(randomSeed);
-  NoModel evaluator;
-  method->make(problemOf(space, feasibility, evaluator, random))->initialise();
+  if (drawsAnySet || !isSearch || !earlierSearches_.empty()) return;            // a search that is continued had begun
+  const std::int32_t samples = feasibility.isTested() ? repetitions.count : 1;  // otherwise all are alike
+  for (std::int32_t i = 0; i < samples; ++i) {
+    UniformGenerator random(repetitionSeed(randomSeed, i));
+    NoModel evaluator;
+    method->make(problemOf(space, feasibility, evaluator, random))->initialise();
+  }
 }
 
-SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator) {
-  UniformGenerator random(randomSeed);
+SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator, std::int32_t seed,
+                                       const PeriodicStep& step) {
+  UniformGenerator random(seed);
   SearchProblem problem = problemOf(context.space, context.feasibility, evaluator, random);
-  if (context.feasibility.isTested()) {
-    warnOfInfeasibleSets(context, givenSets(context.space), kWhatGivenSets, stopping.maxEvaluations);
-  }
   std::optional<ProposalSelector> selector;
   if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds, problem.feasibility);
   if (fitting_) problem.residuals = &fitting_->problem();
-  return method->run(std::move(problem), [&context](std::string_view line) { context.log.reportLine(line); });
+  return method->run(std::move(problem), step);
+}
+
+SearchSummary OptimisationTask::searchAll(const TaskContext& context) {
+  if (context.feasibility.isTested()) {
+    warnOfInfeasibleSets(context, givenSets(context.space), kWhatGivenSets, stopping.maxEvaluations);
+  }
+  if (repetitions.count > 1) {
+    repeated_.emplace(repetitions, randomSeed);
+    return repeated_->run(
+        context,
+        [&](Evaluator& evaluator, std::int32_t seed, const PeriodicStep& step) {
+          return search(context, evaluator, seed, step);
+        },
+        [&](const SearchSummary& summary, const BestCourse& course) { logEnd(context, summary, course); });
+  }
+  WatchedEvaluator evaluator(context.evaluator);
+  SearchSummary summary =
+      search(context, evaluator, randomSeed, [&context](std::string_view line) { context.log.reportLine(line); });
+  context.log.line("");
+  logEnd(context, summary, evaluator.course());
+  return summary;
+}
+
+/// Why a search has ended, and what is to be said of its course.
+void OptimisationTask::logEnd(const TaskContext& context, const SearchSummary& summary,
+                              const BestCourse& course) const {
+  for (const std::string& note : summary.notes) context.log.line(note);
+  context.log.line(summary.terminationMessage);
+  const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
+  for (const std::string& line : courseLines(course, isBudgetUsed)) context.log.line(line);
+  if (summary.replacedCount > 0) {
+    context.log.line(fmt::format(
+        "Proposed points that cannot be run (a constraint is violated, or an equation has no finite value) and were "
+        "replaced before their evaluation: {}",
+        summary.replacedCount));
+  }
+  if (!warnOfNoWidth(context, summary, method->populationSize())) warnOfHeldParameters(context, summary);
 }
 
 TaskOutcome OptimisationTask::run(const TaskContext& context) {
@@ -539,25 +604,17 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
     fitting_ = std::make_unique<ResidualFitting>(context);
     if (const auto text = fitting_->otherMeasuresText(context)) context.log.warning(*text);
   }
-  WatchedEvaluator evaluator(context.evaluator);
-  const SearchSummary summary = search(context, evaluator);
-  context.log.line("");
-  for (const std::string& note : summary.notes) context.log.line(note);
-  context.log.line(summary.terminationMessage);
-  const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
-  for (const std::string& line : courseLines(evaluator.course(), isBudgetUsed)) context.log.line(line);
-  if (summary.replacedCount > 0) {
-    context.log.line(fmt::format(
-        "Proposed points that cannot be run (a constraint is violated, or an equation has no finite value) and were "
-        "replaced before their evaluation: {}",
-        summary.replacedCount));
+  const SearchSummary summary = searchAll(context);
+  TaskOutcome outcome{summary.terminationMessage};
+  if (repeated_) {
+    repeated_->addResults(context.space, outcome);
+    for (const std::string& line : outcome.report) context.log.reportLine(line);
+    context.log.line("");
   }
-  if (!warnOfNoWidth(context, summary, method->populationSize())) warnOfHeldParameters(context, summary);
   const std::vector<ParameterSet> best{summary.best};
-  if (best.front().empty()) return {summary.terminationMessage};
+  if (best.front().empty()) return outcome;
   if (context.searchEnded) context.searchEnded(summary);
   logBestSet(context, best.front(), summary.bestResult);
-  TaskOutcome outcome{summary.terminationMessage};
   if (fitting_) {
     fitting_->addCovariance(context, outcome);
     logReport(context, outcome.report);
@@ -570,6 +627,11 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
 
 std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext& context,
                                                                const UnfinishedBatch& /*made*/) const {
+  if (repeated_) {
+    TaskOutcome outcome{std::string(kEndOfTask)};
+    repeated_->addResults(context.space, outcome);
+    return outcome;
+  }
   if (!fitting_ || !fitting_->hasDerivatives()) return std::nullopt;
   TaskOutcome outcome{std::string(kEndOfTask)};
   fitting_->addCovariance(context, outcome);
@@ -577,6 +639,7 @@ std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext
 }
 
 std::optional<int> OptimisationTask::evaluationsInBatches() const {
+  if (repeated_) return repeated_->evaluationCount();
   if (!fitting_ || !fitting_->hasDerivatives()) return 0;
   return fitting_->problem().evaluationCount;
 }
@@ -590,6 +653,7 @@ TaskReport OptimisationTask::report() const {
 }
 
 std::optional<RaisedBudget> OptimisationTask::raisedBudget(const SearchHistory& history) const {
+  if (auto raised = raisedRepetitions(repetitions, stopping, history)) return raised;
   if (stopping.maxEvaluations <= history.budget) return std::nullopt;
   return method->raiseBudget(history, stopping, initialSample);
 }

@@ -4,6 +4,7 @@
 #include "algorithms/searches/search_methods.h"
 #include "algorithms/searches/stopping_criteria.h"
 #include "algorithms/surrogate/proposal_selector.h"
+#include "run/tasks/repeated_search.h"
 #include "run/tasks/residual_fit.h"
 #include "run/tasks/task.h"
 
@@ -23,7 +24,7 @@ class OptimisationTask final : public Task {
   std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
-  int plannedEvaluations() const override { return stopping.maxEvaluations; }
+  int plannedEvaluations() const override { return repetitions.count * stopping.maxEvaluations; }
   int mostAtOnce() const override;
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
@@ -48,6 +49,7 @@ class OptimisationTask final : public Task {
   InitialSampleSettings initialSample;
   StoppingCriteria stopping;
   SurrogateSettings surrogate;
+  RepetitionSettings repetitions;
 
  private:
   /// Whether a surrogate model assists the search.
@@ -65,7 +67,9 @@ class OptimisationTask final : public Task {
   std::vector<ParameterSet> givenSets(const SearchSpace& space) const;
   SearchProblem problemOf(const SearchSpace& space, const Feasibility& feasibility, Evaluator& evaluator,
                           UniformGenerator& random) const;
-  SearchSummary search(const TaskContext& context, Evaluator& evaluator);
+  SearchSummary search(const TaskContext& context, Evaluator& evaluator, std::int32_t seed, const PeriodicStep& step);
+  SearchSummary searchAll(const TaskContext& context);
+  void logEnd(const TaskContext& context, const SearchSummary& summary, const BestCourse& course) const;
   void requireResiduals(const TaskReading& reading, const SetupSection& section) const;
 
   std::optional<std::string> sampleText_;         ///< of a sample file, which is read once
@@ -73,6 +77,7 @@ class OptimisationTask final : public Task {
   EarlierSets earlierSets_;                       ///< of an earlier run
   std::vector<EarlierSearch> earlierSearches_;
   std::unique_ptr<ResidualFitting> fitting_;  ///< of a search by residuals, once it runs
+  std::optional<RepeatedSearch> repeated_;    ///< once it runs
 };
 
 }  // namespace mirevo

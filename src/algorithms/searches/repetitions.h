@@ -1,0 +1,72 @@
+#pragma once
+
+#include <cstdint>
+#include <limits>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "common/data_table.h"
+#include "common/parameter_set.h"
+#include "parameters/search_space.h"
+
+namespace mirevo {
+
+/// How the repetitions of a search follow one another.
+enum class RepetitionOrder : std::int32_t {
+  consecutive,  ///< each begins when the one before it has ended
+  sideBySide    ///< all go on at the same time
+};
+
+/// A search that is made several times, with one seed after the other.
+struct RepetitionSettings {
+  std::int32_t count = 1;
+  RepetitionOrder order = RepetitionOrder::consecutive;
+
+  bool areSideBySide() const { return count > 1 && order == RepetitionOrder::sideBySide; }
+};
+
+/// More than any spread needs; each has a thread when they go on side by side.
+inline constexpr std::int32_t kMostRepetitions = 1000;
+
+/// The seed of the repetition with this 0-based index: that of the run, and then one more each time; one less for a
+/// negative seed, of which the sign does not matter. Behind the largest number follow seeds whose streams are those
+/// that larger ones would have, so that no two repetitions have the same.
+std::int32_t repetitionSeed(std::int32_t seed, std::int32_t index);
+/// "seeds 3 to 7", "seed 3"
+std::string seedsText(std::int32_t seed, std::int32_t count);
+
+/// A repetition as far as it has come.
+struct Repetition {
+  std::int32_t seed = 0;
+  int evaluations = 0;                                          ///< whose results it has
+  int bestEvaluation = 0;                                       ///< the number in the run; 0: none has succeeded
+  double aggregate = std::numeric_limits<double>::quiet_NaN();  ///< of the best
+  ParameterSet best = {};                                       ///< search scale; empty without a best one
+  int loops = 0;                                                ///< 0 until it has ended
+  std::string termination = {};                                 ///< empty until it has ended
+};
+
+/// Successive evaluations of one repetition, all of these numbers.
+struct RepetitionStretch {
+  int repetition = 0;  ///< from 1
+  int first = 0;
+  int last = 0;
+};
+
+/// The repetitions that have begun, for programs.
+DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchSpace& space);
+/// Which evaluations are whose, for programs.
+DataTable repetitionRowTable(std::span<const RepetitionStretch> stretches);
+
+/// Best values that differ from the least by no more than this share of it count as equal to it.
+inline constexpr double kNearlyEqualShare = 0.01;
+/// A parameter is poorly identified if at nearly equal values it takes up more than this share of its range.
+inline constexpr double kWideShare = 0.1;
+
+/// The repetitions and their spread for people: a table, the spread of the best values and of each parameter of the
+/// best sets, and what follows from them. `planned`: how many repetitions there are to be.
+std::vector<std::string> repetitionLines(std::span<const Repetition> repetitions, const SearchSpace& space,
+                                         std::int32_t planned);
+
+}  // namespace mirevo

@@ -1,0 +1,67 @@
+#pragma once
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "algorithms/searches/best_course.h"
+#include "algorithms/searches/repetitions.h"
+#include "common/settings/keyword_row.h"
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+inline constexpr std::string_view kRepetitionsKeyword = "Repetitions";
+inline constexpr std::string_view kRepetitionOrderKeyword = "Repetition_Order";
+
+/// Takes a value of kRepetitionOrderKeyword, one of repetitionOrderNames().
+void takeRepetitionOrder(RepetitionSettings& settings, const SetupValue& value);
+std::span<const CodeName> repetitionOrderNames();
+/// Warns of an order without repetitions, and refuses repetitions of a search for which they make no sense.
+void requireRepetitions(const RepetitionSettings& settings, const SearchFacts& facts, const SetupSection& section);
+/// Refuses a budget that, taken so often, is more evaluations than a run can number.
+void requireRepeatedBudget(const RepetitionSettings& settings, const StoppingCriteria& stopping,
+                           const SetupSection& section);
+/// "Repetitions: 5 of up to 1000 evaluations each, one after the other, seeds 1 to 5"; for more than one.
+std::string repetitionsText(const RepetitionSettings& settings, const StoppingCriteria& stopping, std::int32_t seed);
+
+/// What becomes of a run with `history` when its budget or the number of its repetitions is raised; empty if neither
+/// was, or if it had and has one repetition.
+std::optional<RaisedBudget> raisedRepetitions(const RepetitionSettings& settings, const StoppingCriteria& stopping,
+                                              const SearchHistory& history);
+
+/// The repetitions of a search: each is the search that a run with its seed would make. The transformation of the
+/// objective functions, where it is determined by an initial sample, is determined by that of the first one, so that
+/// all aggregates can be compared.
+class RepeatedSearch final {
+ public:
+  /// One search with this seed, from its start to its end.
+  using Search = std::function<SearchSummary(Evaluator&, std::int32_t seed, const PeriodicStep&)>;
+  /// Called when a repetition has ended, with the course of its best value.
+  using Ended = std::function<void(const SearchSummary&, const BestCourse&)>;
+
+  RepeatedSearch(const RepetitionSettings& settings, std::int32_t seed) : settings_(settings), seed_(seed) {}
+
+  /// Runs them and returns what the best of them has found, of equals the first, with the message that all have ended.
+  SearchSummary run(const TaskContext& context, const Search& search, const Ended& ended);
+
+  /// Adds lines and tables about the repetitions as far as they have come.
+  void addResults(const SearchSpace& space, TaskOutcome& outcome) const;
+  /// Evaluations whose results they have.
+  int evaluationCount() const;
+
+ private:
+  class Watch;
+
+  void end(std::size_t index, const SearchSummary& summary);
+
+  RepetitionSettings settings_;
+  std::int32_t seed_;
+  std::vector<Repetition> repetitions_;  ///< those that have begun
+  std::vector<RepetitionStretch> stretches_;
+  int handedOut_ = 0;  ///< sets, of all repetitions
+  std::vector<BestCourse> courses_;
+  SearchSummary best_;
+};
+
+}  // namespace mirevo

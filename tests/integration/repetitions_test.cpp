@@ -1,0 +1,193 @@
+#include <algorithm>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/data_table.h"
+#include "integration/model_folder.h"
+#include "integration/mpi_job.h"
+#include "matchers.h"
+
+namespace mirevo::testing {
+namespace {
+
+constexpr const char* kInSideBySideOrder = "Repetition_Order = 'side by side'";
+/// Searches that are made several times.
+class Repeated : public ::testing::Test {
+ protected:
+  void writeSetup(const RunSettings& settings, int count, const std::string& order) {
+    setup_ = folder_.writeSetup(settings);
+    folder_.editSetup("Use_Surrogate_Model", fmt::format("Repetitions = {}\n{}\nUse_Surrogate_Model", count, order));
+  }
+  ProgramResult run(int processes = 0) const {
+    return processes == 0 ? runProgram({setup_}) : startJob(processes, {setup_}).wait();
+  }
+  void runToEnd(int processes = 0) const {
+    const ProgramResult result = run(processes);
+    ASSERT_EQ(result.exitCode, 0) << result.error << log();
+  }
+  /// All that a run has found.
+  std::vector<std::string> results() const {
+    std::vector<std::string> texts{withoutDates(folder_.read(kResults)), folder_.read(kTable), folder_.read(kRows)};
+    EXPECT_THAT(texts, Each(Not(IsEmpty())));
+    return texts;
+  }
+  void removeResults() const {
+    for (const auto& entry : std::filesystem::directory_iterator(folder_.path())) {
+      const std::string name = entry.path().filename().string();
+      if (name.starts_with("basin") && name != "basin.kdx") std::filesystem::remove_all(entry.path());
+    }
+  }
+  ReadTable table() const { return readDataTable(folder_.read(kTable)); }
+  std::string log() const { return folder_.read("basin.log"); }
+
+  static constexpr const char* kResults = "basin_Optimisation.dat";
+  static constexpr const char* kTable = "basin_Optimisation_Repetitions.dat";
+  static constexpr const char* kRows = "basin_Optimisation_RepetitionRows.dat";
+
+  ModelFolder folder_;
+  std::string setup_;
+};
+
+TEST_F(Repeated, AnyNumberOfSlotsOrRanksMakesTheSameFiles) {
+  const std::tuple<RunSettings, std::string, std::vector<int>, int> cases[] = {
+      {{.maxEvaluations = 10}, kInSideBySideOrder, {2, 3}, 4},
+      {{.algorithm = 0, .includesInitial = false, .aggregation = 1, .maxEvaluations = 16}, kInSideBySideOrder, {3}, 0},
+      {{.search = "PDDS", .maxEvaluations = 12}, kInSideBySideOrder, {4}, 0},
+      {{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 30}, kInSideBySideOrder, {3}, 0},
+      {{.algorithm = 1, .maxEvaluations = 14}, "", {3}, 3},
+  };
+  folder_.useScript(kSleepByParameters);
+  for (auto [settings, order, slots, processes] : cases) {
+    SCOPED_TRACE(::testing::Message() << settings.algorithm << settings.search << order);
+    removeResults();
+    writeSetup(settings, 3, order);
+    runToEnd();
+    const auto expected = results();
+    EXPECT_EQ(table().rows.size(), 3U);
+    for (const int count : slots) {
+      settings.slots = count;
+      writeSetup(settings, 3, order);
+      runToEnd();
+      EXPECT_EQ(results(), expected) << count;
+    }
+    if (processes == 0 || !mpirunIsInstalled()) continue;
+    runToEnd(processes);
+    EXPECT_EQ(results(), expected) << processes << " processes";
+  }
+}
+
+TEST_F(Repeated, ARunThatWasCutOffAnywhereGoesOnToTheSameFiles) {
+  for (const std::string order : {"", kInSideBySideOrder}) {
+    removeResults();
+    writeSetup({.algorithm = 0, .includesInitial = false, .maxEvaluations = 20, .restart = 1}, 3, order);
+    runToEnd();
+    const auto expected = results();
+    const std::string rows = folder_.read(kResults);
+    for (const char* last : {"\n5\t", "\n21\t", "\n34\t", "\n50\t"}) {
+      folder_.write(kResults, rows.substr(0, rows.find(last) + 9));
+      runToEnd();
+      EXPECT_EQ(results(), expected) << last << order;
+      EXPECT_THAT(log(), HasSubstr("evaluations are taken from"));
+    }
+  }
+}
+
+TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
+  const RunSettings settings{.algorithm = 1, .maxEvaluations = 20, .restart = 1};
+  for (const auto& [before, cutAt] : {std::pair(1, ""), std::pair(2, ""), std::pair(2, "\n25\t")}) {
+    removeResults();
+    writeSetup(settings, before, "");
+    runToEnd();
+    const std::string rows = folder_.read(kResults);
+    if (*cutAt != '\0') folder_.write(kResults, rows.substr(0, rows.find(cutAt) + 9));
+    writeSetup(settings, 3, "");
+    runToEnd();
+    EXPECT_THAT(log(), HasSubstr(fmt::format("Repetitions was raised from {} to 3: further ones follow", before)));
+    const auto found = results();
+    removeResults();
+    runToEnd();
+    EXPECT_EQ(results(), found) << before << cutAt;
+  }
+  RunSettings raised = settings;
+  raised.maxEvaluations = 30;
+  const std::tuple<RunSettings, int, std::string, const char*> refused[] = {
+      {raised, 3, "", "Max_No_Evaluations: 20 then, 30 now: it holds for each of 3 repetitions"},
+      {settings, 2, "", "Repetitions of OPTIMISATION_ALGORITHM: 3 then, 2 now"},
+      {settings, 4, kInSideBySideOrder, "Repetition_Order of OPTIMISATION_ALGORITHM: absent then, 'side by side' now"}};
+  const auto before = results();
+  for (const auto& [other, count, order, reason] : refused) {
+    writeSetup(other, count, order);
+    EXPECT_EQ(run().exitCode, 1);
+    EXPECT_THAT(log(), AllOf(HasSubstr(reason), EndsWith("\n\nError: Unable to continue the earlier run\n")));
+    EXPECT_EQ(results(), before);
+  }
+  removeResults();
+  writeSetup(settings, 2, kInSideBySideOrder);
+  runToEnd();
+  writeSetup(settings, 3, kInSideBySideOrder);
+  EXPECT_EQ(run().exitCode, 1);
+  EXPECT_THAT(log(), HasSubstr("Repetitions of OPTIMISATION_ALGORITHM: 2 then, 3 now"));
+}
+
+TEST_F(Repeated, WhatEndsARunLeavesTheRepetitionsAsFarAsTheyHadCome) {
+  // After 12 model runs each waits for the one that cancels, or fails.
+  const std::string counted = "n=1; while ! mkdir ../tickets/$n; do n=$((n + 1)); done 2>/dev/null\n";
+  for (const std::string order : {"", kInSideBySideOrder}) {
+    for (const bool fails : {false, true}) {
+      removeResults();
+      std::filesystem::remove_all(folder_ / "tickets");
+      std::filesystem::create_directory(folder_ / "tickets");
+      folder_.useScript(counted + (fails ? "test $n -gt 12 && exit 3" : "while test $n -gt 12; do sleep 0.05; done"));
+      writeSetup({.search = "PDDS", .maxEvaluations = 10, .slots = 2}, 3, order);
+      RunningProgram program({setup_});
+      if (!fails) {
+        ASSERT_TRUE(waitUntil([&] { return folder_.exists("tickets/14"); }));
+        folder_.write("basin._kill_", "");
+      }
+      const ProgramResult result = program.wait();
+      EXPECT_EQ(result.exitCode, 1);
+      EXPECT_THAT(log(), HasSubstr(fails ? "Error: Unable to continue. No of failed simulations too high."
+                                         : "Simulation cancelled"));
+      EXPECT_THAT(log(), HasSubstr("repetitions of the search"));
+      const ReadTable found = table();
+      ASSERT_EQ(found.rows.size(), order.empty() ? 2U : 3U);
+      EXPECT_THAT(found.headLines, Contains(StartsWith("Unfinished run: statistics of ")));
+      EXPECT_EQ(found.rows[0].back().empty(), !order.empty()) << "the first one has ended where they are consecutive";
+      EXPECT_EQ(found.rows[1].back(), "");
+      for (const auto& row : found.rows) EXPECT_NE(row[3], "0") << "each has a best set";
+      EXPECT_FALSE(readDataTable(folder_.read(kRows)).rows.empty());
+    }
+  }
+}
+
+TEST_F(Repeated, ASetupIsCheckedWithItsRepetitions) {
+  const std::tuple<RunSettings, int, std::string, const char*> refused[] = {
+      {{}, 0, "", "Error: No. of repetitions of the search invalid"},
+      {{}, 1001, "", "Error: No. of repetitions of the search invalid"},
+      {{}, 2, "Repetition_Order = 'at once'", "'side by side'"},
+      {{.search = "GLM"}, 2, "", "expected 1 for GLM, found 2: its Starts begin at several sets of one sample"},
+      {{.maxEvaluations = 1500000000}, 2, "", "expected at most 1073741823 for Repetitions = 2, found 1500000000"},
+      {{.slots = 2},
+       2,
+       "",
+       "expected 1 with this Algorithm_Type, found 2; several model runs at a time: Repetition_Order = 'side by "
+       "side', "},
+      {{.slots = 2}, 1, kInSideBySideOrder, "expected 1 with this Algorithm_Type, found 2"}};
+  for (const auto& [settings, count, order, reason] : refused) {
+    writeSetup(settings, count, order);
+    const ProgramResult result = runProgram({"--check", setup_});
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_THAT(result.output + result.error, HasSubstr(reason)) << count << order;
+  }
+  writeSetup({.maxEvaluations = 25, .slots = 8}, 4, kInSideBySideOrder);
+  const ProgramResult result = runProgram({"--check", setup_});
+  EXPECT_EQ(result.exitCode, 0) << result.error;
+  EXPECT_THAT(result.output, HasSubstr("Dynamically Dimensioned Search, 4 repetitions\nPlanned model runs: 101\n"));
+  EXPECT_THAT(result.output + result.error, HasSubstr("only 4 can be used by the evaluations of this run"));
+  writeSetup({}, 1, kInSideBySideOrder);
+  EXPECT_THAT(runProgram({"--check", setup_}).output, HasSubstr("has no effect with Repetitions = 1"));
+}
+
+}  // namespace
+}  // namespace mirevo::testing
