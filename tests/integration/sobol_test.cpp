@@ -223,18 +223,19 @@ TEST(SobolRun, SaysHowItsDistributionsAndConstraintsFitToTheBounds) {
 }
 
 TEST(SobolRun, OtherBootstrapSamplesAndLimitsTakeAllResultsOver) {
-  const std::string settings = "Sample_Size = 32\nBootstrap_Samples = 300\nNegligible_Index = 0.1";
+  const std::string design = "Sample_Size = 32\nGroup = 'one: a'\nGroup = 'two: b'";
+  const std::string settings = design + "\nBootstrap_Samples = 300\nNegligible_Index = 0.1";
   const ModelFolder fresh;
   ASSERT_EQ(runProgram({sobolSetup(fresh, settings)}).exitCode, 0);
   const ModelFolder folder;
-  ASSERT_EQ(runProgram({sobolSetup(folder, "Sample_Size = 32")}).exitCode, 0);
+  ASSERT_EQ(runProgram({sobolSetup(folder, design)}).exitCode, 0);
   const std::string setup = sobolSetup(folder, settings);
   folder.editSetup("Restart = 0", "Restart = 1");
   const ProgramResult run = runProgram({setup});
   ASSERT_EQ(run.exitCode, 0) << run.error;
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n128 of them were taken from the earlier run\n"));
-  EXPECT_EQ(sobolCell(folder.read("basin_Sobol.dat"), {"objective", "fit", "a", "", "total"}, "Upper"),
-            sobolCell(fresh.read("basin_Sobol.dat"), {"objective", "fit", "a", "", "total"}, "Upper"));
+  EXPECT_EQ(sobolCell(folder.read("basin_Sobol.dat"), {"objective", "fit", "one", "", "total"}, "Upper"),
+            sobolCell(fresh.read("basin_Sobol.dat"), {"objective", "fit", "one", "", "total"}, "Upper"));
 }
 
 }  // namespace

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <filesystem>
 #include <map>
+#include <tuple>
 #include <unordered_map>
 #include <utility>
 
@@ -94,11 +95,24 @@ std::array<int, 3> numbersOf(std::string_view version) {
   return numbers;
 }
 
-using SettingIndex = std::map<std::pair<std::string_view, std::string_view>, const ResultSetting*>;
+/// Section, keyword and, of a keyword that may be repeated, the how-manieth it is, from 0.
+using SettingKey = std::tuple<std::string_view, std::string_view, std::size_t>;
+using SettingIndex = std::map<SettingKey, const ResultSetting*>;
 
-SettingIndex indexOf(const RestartSettings& settings) {
+/// The keys of settings in their order.
+std::vector<SettingKey> keysOf(const std::vector<ResultSetting>& settings) {
+  std::map<std::pair<std::string_view, std::string_view>, std::size_t> counts;
+  std::vector<SettingKey> keys;
+  keys.reserve(settings.size());
+  for (const ResultSetting& setting : settings) {
+    keys.emplace_back(setting.section, setting.keyword, counts[{setting.section, setting.keyword}]++);
+  }
+  return keys;
+}
+
+SettingIndex indexOf(const std::vector<SettingKey>& keys, const std::vector<ResultSetting>& settings) {
   SettingIndex index;
-  for (const ResultSetting& setting : settings.settings) index[{setting.section, setting.keyword}] = &setting;
+  for (std::size_t i = 0; i < keys.size(); ++i) index[keys[i]] = &settings[i];
   return index;
 }
 
@@ -118,7 +132,7 @@ std::string shownSection(const SettingIndex& index, std::string_view section) {
     const std::size_t end = std::min(section.find('/', start), section.size());
     const std::string_view part = section.substr(start, end - start);
     for (const std::string_view keyword : {"Parameter_Name", "Name"}) {
-      const auto name = index.find({section.substr(0, end), keyword});
+      const auto name = index.find({section.substr(0, end), keyword, 0});
       if (itemPattern(part) == part || name == index.end()) continue;
       const std::string_view quoted = name->second->value;
       if (quoted.size() < 2) continue;  // of a file that was changed
@@ -188,8 +202,10 @@ std::optional<int> searchBudget(const RestartSettings& settings) {
 }
 
 std::vector<std::string> changedSettings(const RestartSettings& then, const RestartSettings& now) {
-  const SettingIndex before = indexOf(then);
-  const SettingIndex after = indexOf(now);
+  const std::vector<SettingKey> keysThen = keysOf(then.settings);
+  const std::vector<SettingKey> keysNow = keysOf(now.settings);
+  const SettingIndex before = indexOf(keysThen, then.settings);
+  const SettingIndex after = indexOf(keysNow, now.settings);
   std::vector<std::string> changes;
   const auto note = [&](const ResultSetting& setting, const SettingIndex& index, std::string_view change) {
     changes.push_back(fmt::format("{} of {}: {}", setting.keyword, shownSection(index, setting.section), change));
@@ -197,8 +213,9 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
   const auto earlierBudget = searchBudget(then);
   const auto budget = searchBudget(now);
   const bool isRaised = budget && earlierBudget && *budget > *earlierBudget;
-  for (const ResultSetting& setting : now.settings) {
-    const auto found = before.find({setting.section, setting.keyword});
+  for (std::size_t i = 0; i < keysNow.size(); ++i) {
+    const ResultSetting& setting = now.settings[i];
+    const auto found = before.find(keysNow[i]);
     if (found == before.end()) {
       // An earlier version that did not know the keyword worked like its default.
       if (!setting.isDefault) note(setting, after, fmt::format("absent then, {} now", setting.value));
@@ -206,9 +223,9 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
       note(setting, after, fmt::format("{} then, {} now", found->second->value, setting.value));
     }
   }
-  for (const ResultSetting& setting : then.settings) {
-    if (after.count({setting.section, setting.keyword}) > 0) continue;
-    note(setting, before, fmt::format("{} then, absent now", setting.value));
+  for (std::size_t i = 0; i < keysThen.size(); ++i) {
+    if (after.count(keysThen[i]) > 0) continue;
+    note(then.settings[i], before, fmt::format("{} then, absent now", then.settings[i].value));
   }
   for (const FileMark& file : now.files) {
     const auto isSame = [&file](const FileMark& other) {
