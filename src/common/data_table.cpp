@@ -14,6 +14,7 @@ namespace mirevo {
 namespace {
 
 constexpr std::string_view kHexDigits = "0123456789abcdef";
+constexpr std::string_view kRowCount = "Rows: ";
 
 bool hasMeaningToReaders(char c) {
   return static_cast<unsigned char>(c) < ' ' || c == '\x7F' || c == '#' || c == '"';
@@ -109,6 +110,10 @@ std::vector<std::string> cellsOf(std::string_view line) {
 
 }  // namespace
 
+std::string rowCountLine(const DataTable& table) {
+  return fmt::format("{}{}", kRowCount, table.rows.size());
+}
+
 std::string dataTableRow(const std::vector<DataTable::Cell>& cells) {
   std::string row;
   appendCells(row, cells);
@@ -165,7 +170,15 @@ ReadTable readDataTable(std::string_view text) {
       table.columns = cellsOf(line);
     } else if (auto cells = cellsOf(line); cells.size() == table.columns.size()) {
       table.rows.push_back(std::move(cells));
+    } else {
+      table.isDamaged = true;
     }
+  }
+  if (!text.empty() || table.columns.empty()) table.isDamaged = true;
+  for (const std::string& line : table.headLines) {
+    if (!line.starts_with(kRowCount)) continue;
+    const auto count = parseInteger(std::string_view(line).substr(kRowCount.size()));
+    if (count && static_cast<std::size_t>(*count) != table.rows.size()) table.isDamaged = true;
   }
   return table;
 }

@@ -47,6 +47,8 @@ class DataTableParts final {
   std::size_t row_ = 0;
   bool hasHead_ = false;
 };
+/// The head line by which readDataTable() knows whether the rows behind it are complete.
+std::string rowCountLine(const DataTable& table);
 /// One row as in dataTableText(), line end included.
 std::string dataTableRow(const std::vector<DataTable::Cell>& cells);
 /// The `#` lines and the header row alone: the beginning of a file that grows row by row.
@@ -57,6 +59,8 @@ struct ReadTable {
   std::vector<std::string> headLines;
   std::vector<std::string> columns;
   std::vector<std::vector<std::string>> rows;  ///< complete rows only: a last line without a line end is left out
+  /// The last line has no end, a row has too few or too many cells, or there are not as many rows as the head says.
+  bool isDamaged = false;
 
   /// The 0-based index of a column; empty when there is none of that name.
   std::optional<std::size_t> column(std::string_view name) const;

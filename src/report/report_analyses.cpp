@@ -25,6 +25,7 @@
 #include "parameters/parameter_model.h"
 #include "parameters/read_template.h"
 #include "platform/series/time_series_object.h"
+#include "report/analysis_table.h"
 #include "report/series_labels.h"
 
 namespace mirevo {
@@ -125,14 +126,6 @@ std::optional<ReportedBand> readBand(const std::string& path, std::optional<int>
   return band;
 }
 
-/// A table that an analysis has written; an empty one, with the fault, where it cannot be read.
-ReadTable readTable(const std::string& path, std::string& fault) {
-  std::string reason;
-  const auto text = readTextFile(path, reason);
-  if (!text) fault = fmt::format("{}: {}", fileNameOf(path), reason);
-  return readDataTable(text.value_or(""));
-}
-
 /// The numbers in the cells from `first` on; NaN where there is none.
 std::vector<double> numbersOf(const std::vector<std::string>& cells, std::size_t first) {
   std::vector<double> numbers;
@@ -209,10 +202,11 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
 
 std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
   const std::string path = runFilePath(filePrefix, run_files::kSensitivities);
-  std::string damaged = fileNameOf(path) + " is cut off or damaged";
+  std::string damaged = unshownTable(path);
   std::string fault;
-  const ReadTable table = readTable(path, fault);
-  if (!fault.empty()) return fault;
+  const auto read = readAnalysisTable(path, fault);
+  if (!read) return fault;
+  const ReadTable& table = *read;
   const auto kind = table.column("Kind");
   const auto output = table.column("Output");
   const auto derivative = table.column("Derivative");
@@ -261,21 +255,21 @@ std::optional<ReportedCovariance> reportedCovariance(const std::string& filePref
   const bool hasNone =
       !std::filesystem::exists(limitsFile, ignored) && !std::filesystem::exists(correlationFile, ignored);
   if (hasNone) return std::nullopt;
-  const ReadTable limits = readTable(limitsFile, fault);
-  const ReadTable correlation = readTable(correlationFile, fault);
-  if (!fault.empty()) return std::nullopt;
-  const auto leftOut = limits.column("LeftOut");
+  const auto limits = readAnalysisTable(limitsFile, fault);
+  const auto correlation = readAnalysisTable(correlationFile, fault);
+  if (!limits || !correlation) return std::nullopt;
+  const auto leftOut = limits->column("LeftOut");
   constexpr std::size_t kNumbers = 4;  // behind the name
   if (!leftOut || *leftOut <= kNumbers) {
-    fault = fileNameOf(limitsFile) + " is damaged";
+    fault = unshownTable(limitsFile);
     return std::nullopt;
   }
   ReportedCovariance found;
   found.correlationFile = fileNameOf(correlationFile);
-  for (const std::string& line : limits.headLines) {
+  for (const std::string& line : limits->headLines) {
     if (line.starts_with("Lag-1 correlation")) found.lagText = line;
   }
-  for (const std::vector<std::string>& cells : limits.rows) {
+  for (const std::vector<std::string>& cells : limits->rows) {
     if (!cells[*leftOut].empty()) {
       found.leftOut.push_back({cells.front(), cells[*leftOut]});
       continue;
@@ -287,7 +281,7 @@ std::optional<ReportedCovariance> reportedCovariance(const std::string& filePref
     found.lower95.push_back(numbers[2]);
     found.upper95.push_back(numbers[3]);
   }
-  for (const std::vector<std::string>& cells : correlation.rows) found.correlation.push_back(numbersOf(cells, 1));
+  for (const std::vector<std::string>& cells : correlation->rows) found.correlation.push_back(numbersOf(cells, 1));
   const auto isRow = [&found](const std::vector<double>& row) { return row.size() == found.names.size(); };
   if (found.correlation.size() == found.names.size() &&
       std::all_of(found.correlation.begin(), found.correlation.end(), isRow)) {

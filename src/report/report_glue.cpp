@@ -12,6 +12,7 @@
 #include "common/files.h"
 #include "common/run_files.h"
 #include "common/text.h"
+#include "report/analysis_table.h"
 
 namespace mirevo {
 namespace {
@@ -84,15 +85,11 @@ bool isLogarithmic(std::string_view heading, std::span<const ModelParameter> par
 std::optional<ReportedGlue> reportedGlue(const std::string& filePrefix, std::span<const ModelParameter> parameters,
                                          std::string& fault) {
   const std::string path = runFilePath(filePrefix, run_files::kGlue);
-  std::string reason;
-  const auto text = readTextFile(path, reason);
-  if (!text) {
-    fault = fmt::format("{}: {}", fileNameOf(path), reason);
-    return std::nullopt;
-  }
-  const ReadTable table = readDataTable(*text);
+  const auto read = readAnalysisTable(path, fault);
+  if (!read) return std::nullopt;
+  const ReadTable& table = *read;
   if (table.columns.size() < kFirstParameter || table.columns[kWeight] != "Weight") {
-    fault = fileNameOf(path) + " is damaged";
+    fault = unshownTable(path);
     return std::nullopt;
   }
   ReportedGlue glue;

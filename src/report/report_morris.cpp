@@ -7,6 +7,7 @@
 #include "common/data_table.h"
 #include "common/files.h"
 #include "common/run_files.h"
+#include "report/analysis_table.h"
 
 namespace mirevo {
 namespace {
@@ -52,13 +53,9 @@ void writeLimited(JsonWriter& json, std::string_view name, const LimitedValue& v
 
 std::vector<ReportedScreening> reportedMorris(const std::string& filePrefix, std::string& fault) {
   const std::string path = runFilePath(filePrefix, run_files::kMorris);
-  std::string reason;
-  const auto text = readTextFile(path, reason);
-  if (!text) {
-    fault = fileNameOf(path) + ": " + reason;
-    return {};
-  }
-  const ReadTable table = readDataTable(*text);
+  const auto read = readAnalysisTable(path, fault);
+  if (!read) return {};
+  const ReadTable& table = *read;
   Columns columns(table);
   const std::size_t kind = columns.of("Kind");
   const std::size_t name = columns.of("Name");
@@ -76,7 +73,7 @@ std::vector<ReportedScreening> reportedMorris(const std::string& filePrefix, std
   const std::size_t topStability = columns.of("TopStability");
   const std::size_t together = columns.of("FixedTogether");
   if (!columns.isComplete() || table.rows.empty()) {
-    fault = fileNameOf(path) + " is cut off or damaged";
+    fault = unshownTable(path);
     return {};
   }
   std::vector<ReportedScreening> screenings;

@@ -7,6 +7,7 @@
 #include <map>
 #include <numeric>
 #include <string_view>
+#include <unordered_map>
 #include <utility>
 
 #include <fmt/format.h>
@@ -16,6 +17,7 @@
 #include "common/files.h"
 #include "common/run_files.h"
 #include "common/text.h"
+#include "report/analysis_table.h"
 
 namespace mirevo {
 namespace {
@@ -44,17 +46,16 @@ struct NamedTable {
 std::optional<NamedTable> readNamed(const std::string& filePrefix, const RunFile& file,
                                     std::initializer_list<std::string_view> columns, std::vector<std::string>& faults) {
   const std::string path = runFilePath(filePrefix, file);
-  NamedTable read{fileNameOf(path), {}};
-  std::string reason;
-  const auto text = readTextFile(path, reason);
-  if (!text) {
-    faults.push_back(fmt::format("{}: {}", read.file, reason));
+  std::string fault;
+  auto table = readAnalysisTable(path, fault);
+  if (!table) {
+    faults.push_back(fault);
     return std::nullopt;
   }
-  read.table = readDataTable(*text);
+  NamedTable read{fileNameOf(path), std::move(*table)};
   const bool isWhole = std::ranges::all_of(columns, [&](std::string_view name) { return !!read.table.column(name); });
   if (isWhole && !read.table.rows.empty()) return read;
-  faults.push_back(read.file + " is damaged, and what it has is not shown");
+  faults.push_back(unshownTable(path));
   return std::nullopt;
 }
 
@@ -264,7 +265,23 @@ void takeChecks(const NamedTable& checks, ReportedPosterior& posterior) {
 }
 
 /// False if it is not a matrix of the dimensions.
+/// The rows of a table of pairs, which there is instead of a large matrix.
+bool takePairs(const NamedTable& pairs, ReportedPosterior& posterior) {
+  std::unordered_map<std::string, std::size_t> places;
+  for (const ReportedDimension& one : posterior.dimensions) places.emplace(one.name, places.size());
+  for (const std::vector<std::string>& cells : pairs.table.rows) {
+    const auto first = places.find(cells[0]);
+    const auto second = places.find(cells[1]);
+    if (first == places.end() || second == places.end()) return false;
+    posterior.largestCorrelations.push_back({first->second, second->second, realCell(cells[2]).value_or(kNaN)});
+  }
+  return true;
+}
+
 bool takeCorrelations(const NamedTable& correlation, ReportedPosterior& posterior) {
+  if (correlation.table.columns == std::vector<std::string>{"First", "Second", "Correlation"}) {
+    return takePairs(correlation, posterior);
+  }
   std::vector<std::vector<double>> matrix;
   for (const std::vector<std::string>& cells : correlation.table.rows) {
     std::vector<double> row;
@@ -274,6 +291,7 @@ bool takeCorrelations(const NamedTable& correlation, ReportedPosterior& posterio
   }
   if (matrix.size() != posterior.dimensions.size()) return false;
   posterior.correlations = std::move(matrix);
+  posterior.largestCorrelations = largestPairs(posterior.correlations);
   return true;
 }
 
@@ -377,7 +395,9 @@ void writePosterior(JsonWriter& json, const ReportedPosterior& posterior) {
   json.key("posterior").beginObject();
   if (posterior.hasPosterior) {
     json.member("state", kStates[static_cast<std::size_t>(words.state)]).member("findings", words.findings);
-    json.member("tradeOffs", tradeOffWords(names, posterior.correlations));
+    if (words.state != Convergence::apart) {
+      json.member("tradeOffs", tradeOffWords(names, posterior.largestCorrelations));
+    }
   }
   json.member("advice", adviceOf(posterior, words.state));
   json.member("rHatLimit", posterior.limits.rHat).member("effectiveLimit", posterior.limits.effectiveSize);

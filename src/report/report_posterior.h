@@ -49,8 +49,9 @@ struct ReportedPosterior {
   std::vector<std::vector<double>> logLikelihoods;
   std::vector<double> checkedRuns;                ///< model runs at which the chains were compared
   std::vector<std::vector<double>> correlations;  ///< of all dimensions; empty if they are not known
-  bool isUnfinished = false;                      ///< the run was interrupted
-  bool hasPosterior = false;                      ///< else the run ended in burn-in, or its table cannot be read
+  std::vector<PairCorrelation> largestCorrelations;
+  bool isUnfinished = false;  ///< the run was interrupted
+  bool hasPosterior = false;  ///< else the run ended in burn-in, or its table cannot be read
 };
 
 /// What Markov chains have written beside their results; empty if there are no chains. Each file that cannot be read is

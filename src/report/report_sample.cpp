@@ -8,6 +8,7 @@
 #include "common/data_table.h"
 #include "common/files.h"
 #include "common/run_files.h"
+#include "report/analysis_table.h"
 
 namespace mirevo {
 
@@ -37,9 +38,11 @@ std::optional<ReportedSampleSensitivity> reportedSampleSensitivity(const std::st
                                                                    std::span<const std::string> parameters,
                                                                    std::string& fault) {
   const std::string path = runFilePath(filePrefix, run_files::kSampleSensitivities);
-  const auto text = readFileIfThere(path);
-  if (!text) return std::nullopt;
-  const ReadTable table = readDataTable(*text);
+  std::error_code ignored;
+  if (!std::filesystem::exists(path, ignored)) return std::nullopt;
+  const auto read = readAnalysisTable(path, fault);
+  if (!read) return std::nullopt;
+  const ReadTable& table = *read;
   ReportedSampleSensitivity found;
   found.parameters.assign(parameters.begin(), parameters.end());
   const std::size_t p = parameters.size();
@@ -68,7 +71,7 @@ std::optional<ReportedSampleSensitivity> reportedSampleSensitivity(const std::st
     }
   }
   if (!isWhole) {
-    fault = fmt::format("{} is cut off or damaged, and not shown", fileNameOf(path));
+    fault = unshownTable(path);
     return std::nullopt;
   }
   found.areCorrelated = std::ranges::any_of(

@@ -15,6 +15,7 @@
 #include "measures/dates.h"
 #include "measures/output_measure.h"
 #include "platform/series/time_series_object.h"
+#include "report/analysis_table.h"
 #include "report/report_analyses.h"
 
 namespace mirevo {
@@ -36,14 +37,6 @@ std::optional<std::vector<std::size_t>> columnsOf(const ReadTable& table, std::i
 
 double numberAt(const std::vector<std::string>& cells, std::size_t column) {
   return realCell(cells[column]).value_or(kNaN);
-}
-
-ReadTable readTableOf(const std::string& filePrefix, const RunFile& file, std::string& fault) {
-  std::string reason;
-  const std::string path = runFilePath(filePrefix, file);
-  const auto text = readTextFile(path, reason);
-  if (!text) fault = fmt::format("{}: {}", fileNameOf(path), reason);
-  return readDataTable(text.value_or(""));
 }
 
 /// The position of a factor, which is added if it is new.
@@ -174,21 +167,22 @@ std::optional<ReportedSobol> reportedSobol(const RunConfig& config, const std::s
   ReportedSobol sobol;
   sobol.negligibleIndex = settings->negligibleIndex;
   std::string fault;
-  const ReadTable indices = readTableOf(filePrefix, run_files::kSobol, fault);
-  const ReadTable stages = readTableOf(filePrefix, run_files::kSobolConvergence, fault);
-  if (fault.empty() && !takeIndices(indices, sobol)) {
-    fault = fileNameOf(runFilePath(filePrefix, run_files::kSobol)) + " is cut off or damaged";
-  }
-  if (!fault.empty()) {
-    faults.push_back(fault);
+  const std::string path = runFilePath(filePrefix, run_files::kSobol);
+  const auto indices = readAnalysisTable(path, fault);
+  if (!indices || !takeIndices(*indices, sobol)) {
+    faults.push_back(indices ? unshownTable(path) : fault);
     return std::nullopt;
   }
-  takeStages(stages, sobol);
+  if (const auto stages = readAnalysisTable(runFilePath(filePrefix, run_files::kSobolConvergence), fault)) {
+    takeStages(*stages, sobol);
+  } else {
+    faults.push_back(fault);
+  }
   const std::vector<std::size_t> shown = measuresOfDistinctPairs(config.measures);
   for (std::size_t k = 0; k < shown.size(); ++k) {
-    const std::string path = runFilePath(filePrefix, run_files::kSobolSeries, static_cast<int>(shown[k]) + 1);
+    const std::string seriesFile = runFilePath(filePrefix, run_files::kSobolSeries, static_cast<int>(shown[k]) + 1);
     std::string ofSeries;
-    auto series = readSeries(path, sobol.factors.size(), ofSeries);
+    auto series = readSeries(seriesFile, sobol.factors.size(), ofSeries);
     if (!ofSeries.empty()) faults.push_back(ofSeries);
     if (!series) continue;
     series->measure = pairName(config.measures, shown[k]);

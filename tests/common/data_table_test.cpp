@@ -57,6 +57,24 @@ TEST(DataTable, RealsInColumnsAndPartsMakeTheSameText) {
   EXPECT_TRUE(joined == "# of a run\n" + text);
 }
 
+TEST(DataTable, WhatIsMissingOfATableIsSeen) {
+  const DataTable table{{}, {"of numbers"}, {"Name", "Value"}, {{"a", 1.5}, {"b", 2.5}}};
+  const std::string rows = dataTableText(table);
+  const std::string head[] = {rowCountLine(table)};
+  EXPECT_EQ(head[0], "Rows: 2");
+  std::string counted;
+  DataTableParts parts(table, head);
+  for (std::string_view part = parts.next(); !part.empty(); part = parts.next()) counted += part;
+  EXPECT_FALSE(readDataTable(counted).isDamaged);
+  EXPECT_FALSE(readDataTable(rows).isDamaged) << "of an earlier version, which did not count";
+  for (std::size_t length = 0; length < counted.size(); ++length) {
+    EXPECT_TRUE(readDataTable(counted.substr(0, length)).isDamaged) << length;
+  }
+  EXPECT_TRUE(readDataTable(rows.substr(0, rows.size() - 2)).isDamaged);
+  EXPECT_TRUE(readDataTable(rows + "c\n").isDamaged);
+  EXPECT_TRUE(readDataTable(counted + "c\t3.5\n").isDamaged);
+}
+
 TEST(DataTable, NumbersComeBackAsTheSameBitsAndWholeRowsOnly) {
   const std::vector<double> values{0.1 + 0.2, -0.0, 5e-324, std::numeric_limits<double>::max(), INFINITY, -INFINITY};
   DataTable table{{}, {}, {"Number", "Value"}, {}};

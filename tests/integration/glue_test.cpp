@@ -206,6 +206,12 @@ TEST(Glue, OfTheFilesOfAnEarlierRunNeedsNoModelRun) {
   changed[cell] = changed[cell] == '9' ? '8' : '9';
   folder.write("first.dat", changed);
   refused("it has rows that do not hold:\n   line ");
+  refused(
+      "Restore these lines from a copy, or delete them: their evaluations are then left out. If the rows are right");
+  folder.write("first.dat", keptResults.substr(0, keptResults.find("\n21\tOK\t") + 1));
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("Warning: 20 of 40 evaluations are missing in "));
+  folder.write("first.dat", changed);
   folder.writeGlue(keywords + "\nEarlier_Result_File = 'basin.dat'");
   refused("Restart = 1 takes them over");
 }
@@ -267,11 +273,16 @@ TEST(Glue, OfChainsSaysThatTheirProposalsAreNoSampleOfTheParameters) {
   folder.writeGlue("Behavioural_Share = 0.2");
   folder.editSetup("'GLUE'", "'DREAM'\n[DREAM]\nLikelihood = 'normal'\n[/DREAM]");
   ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0) << folder.read("basin.log");
-  for (const char* ending : {".dat", "_Restart.dat", "_Checksums.dat"}) {
+  for (const char* ending : {".dat", "_Restart.dat", "_Checksums.dat", "_Simulated.bin"}) {
     std::filesystem::rename(folder / ("basin" + std::string(ending)), folder / ("chains" + std::string(ending)));
   }
-  folder.writeGlue("Behavioural_Share = 0.2\nEarlier_Result_File = 'chains.dat'");
+  const std::string band = folder.read("basin_Band_1.csv");
+  folder.writeGlue("Behavioural_Share = 0.999\nLikelihood = 'equal'\nEarlier_Result_File = 'chains.dat'");
   ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0) << folder.read("basin.log");
+  // The values of the chains' file are doubles with their units; those of the model run are single.
+  EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("There are no bands")));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("of 365 observations lie between"));
+  EXPECT_EQ(splitLines(folder.read("basin_Band_1.csv")).size(), splitLines(band).size());
   EXPECT_THAT(folder.read("basin.log"),
               HasSubstr(" are those of a DREAM run, the proposals of its chains with those that were rejected "));
   EXPECT_FALSE(folder.exists("basin_SampleSensitivities.dat"));

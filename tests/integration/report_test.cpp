@@ -170,9 +170,11 @@ TEST(Report, SaysWhyTheRankingOfASensitivityAnalysisIsAnother) {
   };
   EXPECT_THAT(rankingNote(), Not(HasSubstr("computed again")));
   folder.write("basin_Sensitivities.dat", table.substr(0, table.rfind('\n', table.size() - 2) + 1));
-  EXPECT_THAT(rankingNote(), HasSubstr("result file: basin_Sensitivities.dat is cut off or damaged."));
+  EXPECT_THAT(rankingNote(), HasSubstr("result file: basin_Sensitivities.dat is cut off or damaged, "));
   std::filesystem::remove(folder / "basin_Sensitivities.dat");
-  EXPECT_THAT(rankingNote(), HasSubstr("result file: basin_Sensitivities.dat: No such file or directory."));
+  EXPECT_THAT(
+      rankingNote(),
+      HasSubstr("result file: basin_Sensitivities.dat cannot be read, and what it has is not shown: No such file"));
 }
 
 TEST(Report, OfResultsOfAnEarlierVersion) {

@@ -151,6 +151,13 @@ TEST(SobolRun, OfASimulatedSeriesAreOnesOfEveryTime) {
   EXPECT_THAT(report, HasSubstr(R"("sobol":{"factors":["a","b"],"negligible":0.05,"outputs":[{"kind":"measure")"));
   EXPECT_THAT(report, HasSubstr(R"("series":[{"measure":"flow")"));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("Series of flow, largest total index: a at 100 % of 365 times"));
+  // Of a table that ends after a whole row, the number of rows in its head tells that there were more.
+  const std::string table = folder.read("basin_Sobol.dat");
+  folder.write("basin_Sobol.dat", table.substr(0, table.rfind('\n', table.size() / 2) + 1));
+  EXPECT_EQ(RunningProgram({folder / "basin.kdx"}, {}, MIREVO_REPORT).wait().exitCode, 0);
+  EXPECT_THAT(folder.read("basin_Report.html"),
+              AllOf(HasSubstr("basin_Sobol.dat is cut off or damaged, and what it has is not shown"),
+                    ::testing::Not(HasSubstr(R"("sobol":{"factors")"))));
 }
 
 TEST(SobolRun, AreTheSameWhateverTheSlotsAndAfterARestart) {

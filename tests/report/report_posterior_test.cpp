@@ -24,7 +24,7 @@ constexpr double kPriorWidth = 20.0;
 /// Chains of two dimensions with hostile names: x normal around 3, y = 2 x with noise, on a prior of width 20.
 class PosteriorFiles {
  public:
-  explicit PosteriorFiles(int mostRuns, double burnInShare = 0.2) {
+  explicit PosteriorFiles(int mostRuns, double burnInShare = 0.2, std::size_t matrixLimit = 1000) {
     settings.mostRuns = mostRuns;
     settings.burnInShare = burnInShare;
     DreamProblem problem;
@@ -55,13 +55,13 @@ class PosteriorFiles {
                                      }};
     std::vector<std::vector<double>> prior;
     for (int i = 0; i < 200; ++i) prior.push_back({0.1 * (i - 99.5), 0.1 * (i - 99.5)});
-    summary = summarisePosterior(sampler, dimensions, prior);
+    summary = summarisePosterior(sampler, dimensions, prior, matrixLimit);
     write(chainsTable(sampler, dimensions));
     if (!summary) return;
     write(posteriorTable(*summary, dimensions));
     write(marginalsTable(sampler, dimensions, prior));
     write(convergenceTable(sampler, dimensions));
-    write(matrixTable(run_files::kSampleCorrelation, "Correlation", dimensions.names, summary->correlations));
+    write(posteriorCorrelationTable(*summary, dimensions));
   }
 
   std::optional<ReportedPosterior> reported() {
@@ -158,7 +158,8 @@ TEST(ReportedPosterior, ShowsWhatIsThereOfFilesThatAreCutOffOrMissing) {
     }
     std::filesystem::remove(files.folder / path(*file));
     found = files.reported();
-    EXPECT_THAT(files.faults, ElementsAre(path(*file) + ": No such file or directory"));
+    EXPECT_THAT(files.faults,
+                ElementsAre(path(*file) + " cannot be read, and what it has is not shown: No such file or directory"));
     files.folder.write(path(*file), text);
   }
   files.folder.write(path(run_files::kPosterior), "# nothing\n");
@@ -166,13 +167,25 @@ TEST(ReportedPosterior, ShowsWhatIsThereOfFilesThatAreCutOffOrMissing) {
   ASSERT_TRUE(found);
   EXPECT_FALSE(found->hasPosterior);
   EXPECT_FALSE(found->dimensions[0].draws.empty());
-  EXPECT_THAT(files.faults, ElementsAre("basin_Posterior.dat is damaged, and what it has is not shown"));
+  EXPECT_THAT(files.faults, ElementsAre("basin_Posterior.dat is cut off or damaged, and what it has is not shown"));
 
   for (const std::string& damaged : {std::string(), chains.substr(0, 30), std::string("a\tb\n1\t2\n")}) {
     files.folder.write(path(run_files::kChains), damaged);
     EXPECT_FALSE(files.reported());
     EXPECT_THAT(files.faults, ElementsAre("The chains are not shown: basin_Chains.dat is damaged"));
   }
+}
+
+TEST(ReportedPosterior, OfMoreDimensionsThanAMatrixIsKeptOfHasTheTradeOffsOfThePairs) {
+  PosteriorFiles files(4'000, 0.2, 1);
+  const auto found = files.reported();
+  ASSERT_TRUE(found);
+  EXPECT_THAT(files.faults, IsEmpty());
+  EXPECT_THAT(found->correlations, IsEmpty());
+  JsonWriter json;
+  json.beginObject();
+  writePosterior(json, *found);
+  EXPECT_THAT(json.endObject().take(), HasSubstr("and y trade off: a correlation of 0.99"));
 }
 
 TEST(ReportedPosterior, OfARunThatEndedInBurnInHasTheChainsAlone) {

@@ -277,6 +277,8 @@ GlueSummary summariseGlue(const EvaluatedSample& sample, const GlueWeights& weig
   if (!weights.hasWeights()) return summary;
   if (sample.parameters.size() <= static_cast<std::size_t>(std::max(matrixLimit, 0))) {
     summary.correlations = weightedCorrelations(behavioural, weights.weights);
+  } else {
+    summary.largestCorrelations = largestWeightedCorrelations(behavioural, weights.weights);
   }
   summary.distanceLimit = chanceDistance(weights.effective, weights.successCount);
   return summary;

@@ -82,14 +82,15 @@ struct GlueSummary {
   std::vector<SampleSummary> measures;  ///< of the behavioural sets, weighted, as the following
   std::vector<SampleSummary> objectives;
   std::vector<SampleSummary> validation;
-  std::vector<std::vector<double>> correlations;  ///< of the behavioural sets; empty for too many parameters
+  std::vector<std::vector<double>> correlations;     ///< of the behavioural sets; empty for too many parameters ...
+  std::vector<PairCorrelation> largestCorrelations;  ///< ... of which only these are kept
   /// chanceDistance() of the behavioural sets from all that succeeded: a smaller distance does not tell that the
   /// observations say anything of the parameter. Regional sensitivity analysis (Spear and Hornberger 1980,
   /// doi:10.1016/0043-1354(80)90040-8) compares the same way.
   double distanceLimit = 0.0;
 };
 
-/// Of more parameters than `matrixLimit` there are no correlations.
+/// Of more parameters than `matrixLimit` only the largest correlations are kept.
 GlueSummary summariseGlue(const EvaluatedSample& sample, const GlueWeights& weights, std::int32_t matrixLimit);
 
 /// For programs: `_Glue.dat` with the weight of each successful evaluation, and the tables of sampling with what they

@@ -147,10 +147,11 @@ std::string likelihoodText(const GlueSettings& settings) {
 std::vector<DataTable> glueTables(const EvaluatedSample& sample, const GlueWeights& weights, const GlueSummary& summary,
                                   const GlueJudge& judge, const GlueSettings& settings, const AnalysisNames& names) {
   std::vector<DataTable> tables{quantileTable(summary, names)};
+  const std::string title = "Correlation of the parameters of the behavioural sets, weighted, model scale";
   if (!summary.correlations.empty()) {
-    tables.push_back(matrixTable(run_files::kSampleCorrelation,
-                                 "Correlation of the parameters of the behavioural sets, weighted, model scale",
-                                 names.parameters, summary.correlations));
+    tables.push_back(matrixTable(run_files::kSampleCorrelation, title, names.parameters, summary.correlations));
+  } else if (weights.hasWeights()) {
+    tables.push_back(pairTable(run_files::kSampleCorrelation, title, names.parameters, summary.largestCorrelations));
   }
   tables.push_back(weightTable(sample, weights, judge, settings, names));
   return tables;
@@ -183,9 +184,11 @@ std::vector<std::string> formatGlue(const EvaluatedSample& sample, const GlueWei
   if (!names.validation.empty())
     appendSummaries(lines, "Validation, behavioural", names.validation, summary.validation);
   appendDistances(lines, summary, names.parameters);
+  const std::string title = "Correlation, behavioural";
   if (!summary.correlations.empty()) {
-    append(lines,
-           formatCorrelation("Correlation, behavioural", names.parameters, summary.correlations, correlationFile));
+    append(lines, formatCorrelation(title, names.parameters, summary.correlations, correlationFile));
+  } else {
+    append(lines, formatLargest(title, names.parameters, summary.largestCorrelations, correlationFile));
   }
   return lines;
 }

@@ -101,6 +101,10 @@ std::string meanWarning(const Distribution& distribution, const SearchSpace& spa
 std::string shareWarning(const Distribution& distribution, const SearchSpace& space, std::size_t j,
                          const std::string& bounds) {
   constexpr double kHardlyMeant = 0.45;  // a mean on a bound leaves half
+  if (space.lower[j] == space.upper[j] && distribution.quantile(0.05) == distribution.quantile(0.95)) {
+    return fmt::format("{} has one value alone, {:.6g}, and is not varied: its bounds are equal", space.names[j],
+                       toModelScale(space, j, distribution.quantile(0.5)));
+  }
   const double share = shareWithinBounds(space, j, distribution);
   if (share > kHardlyMeant) return {};
   const std::string what = isNormalOnSearchScale(distribution)
@@ -137,9 +141,12 @@ std::vector<std::string> distributionLines(const ParameterDistributions& distrib
   lines.emplace_back("  Correlations of the normal scores:");
   for (const auto& [i, j] : largestEntries(correlations)) {
     if (correlations[i][j] == 0.0) break;
-    lines.back() +=
-        fmt::format("{} {} and {} {:.4g} (of the ranks {:.4g})", lines.back().ends_with(':') ? "" : ",", space.names[i],
-                    space.names[j], correlations[i][j], rankCorrelationOf(correlations[i][j]));
+    const bool hasTies = isInteger(space, i) || isInteger(space, j) || !distributions[i].isContinuous() ||
+                         !distributions[j].isContinuous();
+    lines.back() += fmt::format("{} {} and {} {:.4g} (of the ranks {}{:.4g})", lines.back().ends_with(':') ? "" : ",",
+                                space.names[i], space.names[j], correlations[i][j],
+                                hasTies ? "nearer to 0, as equal values share their rank, than " : "",
+                                rankCorrelationOf(correlations[i][j]));
   }
   return lines;
 }

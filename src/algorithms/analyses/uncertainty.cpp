@@ -16,7 +16,6 @@ namespace mirevo {
 
 namespace {
 
-constexpr std::size_t kMostLargeCorrelations = 10'000;
 constexpr std::int64_t kMostRedraws = 1'000'000;  // for the whole sample, and as many again for each thousand sets
 
 /// Replaces deviate i by a random value in the stratum (pi_i - 1, pi_i) / N, where pi_i is its rank among the deviates,
@@ -213,7 +212,7 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const
     for (std::size_t i = 0; i < steps.size(); ++i) steps[i] = modelValues[i][j];
     summary.parameters[j] = summariseSample(steps, QuantileKind::ofValues);
   }
-  if (space.size() <= static_cast<std::size_t>(matrixLimit)) {
+  if (space.size() <= static_cast<std::size_t>(std::max(matrixLimit, 0))) {
     summary.correlations = correlationMatrix(modelValues);
   } else {
     summary.largestCorrelations = largestCorrelations(SampleCorrelations(modelValues), kMostLargeCorrelations);
@@ -234,15 +233,7 @@ DataTable correlationTable(const UncertaintySummary& summary, const AnalysisName
   if (summary.largestCorrelations.empty()) {
     return matrixTable(run_files::kSampleCorrelation, title, names.parameters, summary.correlations);
   }
-  DataTable table;
-  table.file = run_files::kSampleCorrelation;
-  table.headLines = {fmt::format("{}: the {} largest of {} parameters", title, summary.largestCorrelations.size(),
-                                 names.parameters.size())};
-  table.columns = {"First", "Second", "Correlation"};
-  for (const PairCorrelation& one : summary.largestCorrelations) {
-    table.rows.push_back({names.parameters[one.first], names.parameters[one.second], one.value});
-  }
-  return table;
+  return pairTable(run_files::kSampleCorrelation, title, names.parameters, summary.largestCorrelations);
 }
 
 }  // namespace
@@ -285,9 +276,7 @@ std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, co
   const std::span<const PairCorrelation> largest = summary.largestCorrelations;
   for (std::string& line : largest.empty()
                                ? formatCorrelation(title, names.parameters, summary.correlations, correlationFile)
-                               : formatLargest(title, names.parameters, largest,
-                                               fmt::format("The {} largest correlations of the {} parameters are in {}",
-                                                           largest.size(), names.parameters.size(), correlationFile))) {
+                               : formatLargest(title, names.parameters, largest, correlationFile)) {
     lines.push_back(std::move(line));
   }
   return lines;

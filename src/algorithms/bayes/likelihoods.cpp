@@ -31,7 +31,11 @@ double lnGamma(double x) {
 
 /// Gamma(shape, 1) by Marsaglia and Tsang (2000, doi:10.1145/358407.358414).
 double drawGamma(double shape, ChainRandom& random) {
-  if (shape < 1.0) return drawGamma(shape + 1.0, random) * std::pow(random.uniform(), 1.0 / shape);
+  if (shape < 1.0) {
+    // Two statements: the order of draws within one expression is the compiler's choice.
+    const double larger = drawGamma(shape + 1.0, random);
+    return larger * std::pow(random.uniform(), 1.0 / shape);
+  }
   const double d = shape - 1.0 / 3.0;
   const double c = 1.0 / std::sqrt(9.0 * d);
   for (;;) {
@@ -185,7 +189,9 @@ SeriesErrors::Step SeriesErrors::stepOver(double days, double correlation) const
 double SeriesErrors::transformed(double value, double lambda) const {
   if (lambda == 1.0) return value;  // the errors are those of the plain values
   const double shifted = value + shift_;
-  if (!(shifted > 0.0)) return kNaN;
+  if (!(shifted >= 0.0)) return kNaN;
+  // Of 0 the limit, -1 / lambda for lambda above 0 and else -infinity: no finite error leads from there to an
+  // observation above 0, and none is drawn.
   const double logarithm = std::log(shifted);
   return std::abs(lambda) < 1e-8 ? logarithm : std::expm1(lambda * logarithm) / lambda;
 }
@@ -194,6 +200,7 @@ double SeriesErrors::restored(double value, double lambda) const {
   if (lambda == 1.0) return value;
   if (std::abs(lambda) < 1e-8) return std::exp(value) - shift_;
   const double base = 1.0 + lambda * value;
+  if (std::isnan(base)) return kNaN;
   // Beyond the end of the transformation: its limit.
   if (!(base > 0.0)) return lambda > 0.0 ? -shift_ : kInfinity;
   return std::pow(base, 1.0 / lambda) - shift_;
@@ -241,6 +248,12 @@ double SeriesErrors::Path::next(std::size_t time, double simulated, ChainRandom&
   before_ = error;
   timeBefore_ = time;
   return errors_->restored(errors_->transformed(level, values_[kLambda]) + error, values_[kLambda]);
+}
+
+bool SeriesErrors::Path::hasErrors(double simulated) const {
+  const double lambda = values_[kLambda];
+  if (!std::isfinite(simulated) || lambda == 1.0) return true;
+  return std::isfinite(errors_->transformed(simulated, lambda));
 }
 
 std::optional<double> SeriesErrors::untransformable() const {

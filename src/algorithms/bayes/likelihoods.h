@@ -111,7 +111,11 @@ class SeriesErrors final {
   class Path {
    public:
     Path(const SeriesErrors& errors, const ErrorValues& values);
+    /// NaN for a value below the negative shift, which has no Box-Cox transformation, and of a missing one.
     double next(std::size_t time, double simulated, ChainRandom& random);
+    /// False for a value that would be observed as it is, or not at all: the Box-Cox transformation of the negative
+    /// shift is -infinity unless lambda is above 0, and there is none of a value below.
+    bool hasErrors(double simulated) const;
 
    private:
     const SeriesErrors* errors_;

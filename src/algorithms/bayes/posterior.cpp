@@ -52,7 +52,8 @@ std::string endText(const DreamSettings& settings, DreamEnd end) {
       return fmt::format("The chains ended as R-hat is at most {:g} and the effective sample size at least {:g}",
                          settings.rHatLimit, settings.effectiveSize);
     case DreamEnd::budget:
-      return fmt::format("The chains ended with their {} model runs", settings.mostRuns);
+      return fmt::format("The chains ended as the next generation would need more than {} model runs",
+                         settings.mostRuns);
     case DreamEnd::generations:
       return "The chains ended as most proposals need no model run: they lie outside the bounds or the prior, violate "
              "constraints, or change parameters of the error model alone";
@@ -114,16 +115,29 @@ void appendQuantiles(const ShownDimensions& dimensions, const PosteriorSummary& 
   lines.push_back(fmt::format("The most probable state is that of evaluation {}", summary.mostProbableRun));
 }
 
-void appendTradeOffs(const ShownDimensions& dimensions, const PosteriorSummary& summary,
-                     std::span<const DimensionFigures> figures, std::string_view correlationFile,
-                     std::vector<std::string>& lines) {
-  const auto& matrix = summary.correlations;
-  for (std::string& line : tradeOffWords(dimensions.names, matrix)) lines.push_back(std::move(line));
+/// What the data have told: nothing while chains are at different places.
+void appendTold(const ShownDimensions& dimensions, const PosteriorSummary& summary,
+                std::span<const DimensionFigures> figures, std::vector<std::string>& lines) {
+  const std::vector<PairCorrelation> pairs =
+      summary.correlations.empty() ? summary.largestCorrelations : largestPairs(summary.correlations);
+  for (std::string& line : tradeOffWords(dimensions.names, pairs)) lines.push_back(std::move(line));
+  constexpr std::size_t kMostLines = 10;
+  std::size_t hardlyNarrower = 0;
   for (const DimensionFigures& one : figures.first(dimensions.modelParameterCount)) {
-    if (isHardlyNarrower(one)) lines.push_back(hardlyNarrowerWords(one));
+    if (isHardlyNarrower(one) && ++hardlyNarrower <= kMostLines) lines.push_back(hardlyNarrowerWords(one));
   }
+  if (hardlyNarrower > kMostLines) {
+    lines.push_back(fmt::format("... and so of {}", countText(hardlyNarrower - kMostLines, "other parameter")));
+  }
+}
+
+void appendCorrelations(const ShownDimensions& dimensions, const PosteriorSummary& summary,
+                        std::string_view correlationFile, std::vector<std::string>& lines) {
   lines.emplace_back();
-  for (std::string& line : formatCorrelation("Correlation", dimensions.names, matrix, correlationFile)) {
+  const std::string title = "Correlation";
+  for (std::string& line : summary.correlations.empty()
+                               ? formatLargest(title, dimensions.names, summary.largestCorrelations, correlationFile)
+                               : formatCorrelation(title, dimensions.names, summary.correlations, correlationFile)) {
     lines.push_back(std::move(line));
   }
 }
@@ -131,7 +145,8 @@ void appendTradeOffs(const ShownDimensions& dimensions, const PosteriorSummary& 
 }  // namespace
 
 std::optional<PosteriorSummary> summarisePosterior(const DreamSampler& sampler, const ShownDimensions& dimensions,
-                                                   std::span<const std::vector<double>> priorDraws) {
+                                                   std::span<const std::vector<double>> priorDraws,
+                                                   std::size_t matrixLimit) {
   const auto check = sampler.checkNow();
   if (!check) return std::nullopt;
   PosteriorSummary summary;
@@ -159,8 +174,20 @@ std::optional<PosteriorSummary> summarisePosterior(const DreamSampler& sampler, 
                                   check->rHat[j],
                                   check->effectiveSizes[j]});
   }
-  summary.correlations = correlationMatrix(rows);
+  if (dimensions.names.size() <= matrixLimit) {
+    summary.correlations = correlationMatrix(rows);
+  } else {
+    summary.largestCorrelations = largestCorrelations(SampleCorrelations(rows), kMostLargeCorrelations);
+  }
   return summary;
+}
+
+DataTable posteriorCorrelationTable(const PosteriorSummary& summary, const ShownDimensions& dimensions) {
+  const std::string title = "Correlation of the posterior";
+  if (!summary.correlations.empty()) {
+    return matrixTable(run_files::kSampleCorrelation, title, dimensions.names, summary.correlations);
+  }
+  return pairTable(run_files::kSampleCorrelation, title, dimensions.names, summary.largestCorrelations);
 }
 
 DataTable chainsTable(const DreamSampler& sampler, const ShownDimensions& dimensions) {
@@ -296,7 +323,9 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
   appendConvergence(settings, figures, lines);
   appendCounts(sampler, lines);
   appendQuantiles(dimensions, *summary, lines);
-  appendTradeOffs(dimensions, *summary, figures, correlationFile, lines);
+  const ConvergenceLimits limits{settings.rHatLimit, settings.effectiveSize};
+  if (convergenceWords(figures, limits).state != Convergence::apart) appendTold(dimensions, *summary, figures, lines);
+  appendCorrelations(dimensions, *summary, correlationFile, lines);
   return lines;
 }
 

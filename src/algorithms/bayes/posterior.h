@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "algorithms/bayes/dream_sampler.h"
+#include "algorithms/numbers/sample_summary.h"
 #include "common/data_table.h"
 
 namespace mirevo {
@@ -31,15 +32,19 @@ struct PosteriorSummary {
     double effectiveSize = 0.0;
   };
   std::vector<Dimension> dimensions;
-  std::vector<std::vector<double>> correlations;
+  std::vector<std::vector<double>> correlations;  ///< empty where only the largest are kept
+  std::vector<PairCorrelation> largestCorrelations;
   std::vector<double> mostProbable;  ///< the state of the largest posterior density
   int mostProbableRun = 0;
   std::size_t draws = 0;  ///< states behind burn-in
 };
 
-/// `priorDraws`: points of the chains' scale. Empty while there are fewer than 4 generations behind burn-in.
+/// `priorDraws`: points of the chains' scale. Of more dimensions than `matrixLimit` only the largest correlations are
+/// kept. Empty while there are fewer than 4 generations behind burn-in.
 std::optional<PosteriorSummary> summarisePosterior(const DreamSampler& sampler, const ShownDimensions& dimensions,
-                                                   std::span<const std::vector<double>> priorDraws);
+                                                   std::span<const std::vector<double>> priorDraws,
+                                                   std::size_t matrixLimit);
+DataTable posteriorCorrelationTable(const PosteriorSummary& summary, const ShownDimensions& dimensions);
 
 /// Every state of every chain; rows with 1 in the column Burn_In are no part of the posterior.
 DataTable chainsTable(const DreamSampler& sampler, const ShownDimensions& dimensions);

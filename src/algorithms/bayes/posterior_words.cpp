@@ -9,8 +9,6 @@
 
 #include <fmt/format.h>
 
-#include "algorithms/numbers/sample_summary.h"
-
 namespace mirevo {
 namespace {
 
@@ -123,15 +121,14 @@ std::optional<std::string> acceptanceWords(double rate) {
          "are usual reasons";
 }
 
-std::vector<std::string> tradeOffWords(std::span<const std::string> names,
-                                       std::span<const std::vector<double>> matrix) {
+std::vector<std::string> tradeOffWords(std::span<const std::string> names, std::span<const PairCorrelation> largest) {
   std::vector<std::string> lines;
-  for (const auto& [i, j] : largestEntries(matrix)) {
-    if (std::abs(matrix[i][j]) < kTradeOff) continue;
+  for (const auto& [i, j, value] : largest.first(std::min(largest.size(), kLargestShown))) {
+    if (std::abs(value) < kTradeOff) continue;
     lines.push_back(
         fmt::format("{} and {} trade off: a correlation of {:.2f}. The data know a combination of them "
                     "better than either",
-                    names[i], names[j], matrix[i][j]));
+                    names[i], names[j], value));
   }
   return lines;
 }

@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+#include "algorithms/numbers/sample_summary.h"
+
 namespace mirevo {
 
 /// What words need to know of a sampled dimension. Numbers that are not known are NaN.
@@ -49,8 +51,8 @@ ConvergenceWords convergenceWords(std::span<const DimensionFigures> dimensions, 
 /// What is usual where few proposals are accepted; empty if they are not few.
 std::optional<std::string> acceptanceWords(double rate);
 
-/// A line for each strong correlation, the strongest first. `matrix`: one row and one column per dimension.
-std::vector<std::string> tradeOffWords(std::span<const std::string> names, std::span<const std::vector<double>> matrix);
+/// A line for each strong correlation of `largest`, in which the strongest stands first, up to kLargestShown.
+std::vector<std::string> tradeOffWords(std::span<const std::string> names, std::span<const PairCorrelation> largest);
 
 /// Whether the data say little of it.
 bool isHardlyNarrower(const DimensionFigures& dimension);

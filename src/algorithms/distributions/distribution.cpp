@@ -182,6 +182,8 @@ class Beta final : public Distribution {
       : unit_(alpha, beta), minimum_(minimum), width_(maximum - minimum) {
     int fault = 0;
     logNorm_ = logGamma(alpha, fault) + logGamma(beta, fault) - logGamma(alpha + beta, fault) + std::log(width_);
+    lowest_ = std::max(kSmallestProbability, 0.5 * (std::nextafter(minimum, kInfinity) - minimum) / width_);
+    highest_ = std::min(kLargestProbability, 1.0 - 0.5 * (maximum - std::nextafter(maximum, -kInfinity)) / width_);
   }
   std::string_view name() const override { return "beta"; }
   std::string text() const override {
@@ -193,8 +195,8 @@ class Beta final : public Distribution {
   double quantile(double p) const override { return minimum_ + width_ * boost::math::quantile(unit_, p); }
   double logDensity(double x) const override {
     if (x < minimum_ || x > minimum_ + width_) return -kInfinity;
-    // Of a limit, where the density may be infinite, that of the next number.
-    const double t = std::clamp((x - minimum_) / width_, kSmallestProbability, kLargestProbability);
+    // A limit, where the density may be infinite, stands for all values that are rounded to it.
+    const double t = std::clamp((x - minimum_) / width_, lowest_, highest_);
     const auto power = [](double shape, double logarithm) { return shape == 1.0 ? 0.0 : (shape - 1.0) * logarithm; };
     return power(unit_.alpha(), std::log(t)) + power(unit_.beta(), std::log1p(-t)) - logNorm_;
   }
@@ -210,6 +212,8 @@ class Beta final : public Distribution {
   double minimum_;
   double width_;
   double logNorm_ = 0.0;
+  double lowest_ = 0.0;   ///< share of the range that is rounded to its lower limit
+  double highest_ = 1.0;  ///< from here on values are rounded to the upper limit
 };
 
 class Discrete final : public Distribution {
@@ -370,7 +374,9 @@ class OnGrid final : public Distribution {
     return quantity_->upperTail(value + 0.5) + (1.0 - share) * probabilityOf(value);
   }
   double quantile(double p) const override {
-    double value = lowest_ + std::floor(quantity_->quantile(p) - lowest_ + 0.5);
+    const double distance = quantity_->quantile(p) - lowest_;
+    // A single value between two integers counts to the lower one, as in probabilityOf().
+    double value = lowest_ + (quantity_->isContinuous() ? std::floor(distance + 0.5) : std::ceil(distance - 0.5));
     double probability = probabilityOf(value);
     const double below = quantity_->cumulative(value - 0.5);
     const double share = probability > 0.0 ? (p - below) / probability : 0.5;

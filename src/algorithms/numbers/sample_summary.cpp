@@ -99,6 +99,16 @@ SampleCorrelations::SampleCorrelations(std::span<const std::vector<double>> rows
   }
 }
 
+SampleCorrelations SampleCorrelations::ofScaled(std::span<const std::vector<double>> columns) {
+  SampleCorrelations made;
+  made.count_ = columns.empty() ? 0 : columns.front().size();
+  for (const std::vector<double>& column : columns) {
+    made.centred_.insert(made.centred_.end(), column.begin(), column.end());
+    made.roots_.push_back(column.empty() || std::isnan(column.front()) ? kNaN : 1.0);
+  }
+  return made;
+}
+
 double SampleCorrelations::of(std::size_t i, std::size_t j) const {
   const std::size_t high = std::max(i, j);  // one order of the two divisions, whose rounding depends on it
   const std::size_t low = std::min(i, j);
@@ -187,17 +197,11 @@ std::vector<MatrixEntry> largestEntries(std::span<const std::vector<double>> mat
   return entries;
 }
 
-std::vector<std::string> formatCorrelation(const std::string& title, std::span<const std::string> names,
-                                           std::span<const std::vector<double>> matrix, std::string_view file) {
-  if (matrix.size() <= kMostShownParameters) return formatTable(title, names, names, matrix);
-  std::vector<PairCorrelation> largest;
-  for (const auto& [i, j] : largestEntries(matrix)) largest.push_back({i, j, matrix[i][j]});
-  return formatLargest(title, names, largest,
-                       fmt::format("All correlations of the {} parameters are in {}", names.size(), file));
-}
+namespace {
 
-std::vector<std::string> formatLargest(const std::string& title, std::span<const std::string> names,
-                                       std::span<const PairCorrelation> largest, const std::string& note) {
+/// The first of `largest` as lines of text; `note` is the last one.
+std::vector<std::string> largestLines(const std::string& title, std::span<const std::string> names,
+                                      std::span<const PairCorrelation> largest, const std::string& note) {
   std::vector<std::string> pairs;
   std::vector<std::vector<double>> values;
   for (const PairCorrelation& one : largest.first(std::min(largest.size(), kLargestShown))) {
@@ -208,6 +212,40 @@ std::vector<std::string> formatLargest(const std::string& title, std::span<const
   std::vector<std::string> lines = formatTable(title, headings, pairs, values);
   lines.push_back("   " + note);
   return lines;
+}
+
+}  // namespace
+
+std::vector<std::string> formatCorrelation(const std::string& title, std::span<const std::string> names,
+                                           std::span<const std::vector<double>> matrix, std::string_view file) {
+  if (matrix.size() <= kMostShownParameters) return formatTable(title, names, names, matrix);
+  return largestLines(title, names, largestPairs(matrix),
+                      fmt::format("All correlations of the {} parameters are in {}", names.size(), file));
+}
+
+std::vector<PairCorrelation> largestPairs(std::span<const std::vector<double>> matrix) {
+  std::vector<PairCorrelation> largest;
+  for (const auto& [i, j] : largestEntries(matrix)) largest.push_back({i, j, matrix[i][j]});
+  return largest;
+}
+
+DataTable pairTable(const RunFile& file, std::string_view headLine, std::span<const std::string> names,
+                    std::span<const PairCorrelation> largest) {
+  DataTable table;
+  table.file = file;
+  table.headLines = {fmt::format("{}: the {} largest of {} parameters", headLine, largest.size(), names.size())};
+  table.columns = {"First", "Second", "Correlation"};
+  for (const PairCorrelation& one : largest) {
+    table.rows.push_back({names[one.first], names[one.second], one.value});
+  }
+  return table;
+}
+
+std::vector<std::string> formatLargest(const std::string& title, std::span<const std::string> names,
+                                       std::span<const PairCorrelation> largest, std::string_view file) {
+  return largestLines(
+      title, names, largest,
+      fmt::format("The {} largest correlations of the {} parameters are in {}", largest.size(), names.size(), file));
 }
 
 }  // namespace mirevo

@@ -45,11 +45,15 @@ class SampleCorrelations final {
  public:
   /// `rows`: n rows of p values each.
   explicit SampleCorrelations(std::span<const std::vector<double>> rows);
+  /// The same of columns that are centred and scaled to length 1 already, NaN where they are constant.
+  static SampleCorrelations ofScaled(std::span<const std::vector<double>> columns);
 
   std::size_t size() const { return roots_.size(); }
   double of(std::size_t i, std::size_t j) const;
 
  private:
+  SampleCorrelations() = default;
+
   std::size_t count_ = 0;        ///< n
   std::vector<double> centred_;  ///< one column after another, without their means
   std::vector<double> roots_;    ///< square roots of the sums of their squares
@@ -87,10 +91,16 @@ inline constexpr std::size_t kLargestShown = 10;
 using MatrixEntry = std::pair<std::size_t, std::size_t>;
 /// The 10 entries above the diagonal with the largest absolute values, the largest first; NaN is left out.
 std::vector<MatrixEntry> largestEntries(std::span<const std::vector<double>> matrix);
+/// The same with their values.
+std::vector<PairCorrelation> largestPairs(std::span<const std::vector<double>> matrix);
 
-/// The largest correlations as lines of text; `note` is the last line.
+/// Of more parameters than a matrix is kept of, the largest correlations: as a table for programs, one pair per row.
+DataTable pairTable(const RunFile& file, std::string_view headLine, std::span<const std::string> names,
+                    std::span<const PairCorrelation> largest);
+inline constexpr std::size_t kMostLargeCorrelations = 10'000;
+/// ... and the first of them as lines of text, with the name of the `file` that has all.
 std::vector<std::string> formatLargest(const std::string& title, std::span<const std::string> names,
-                                       std::span<const PairCorrelation> largest, const std::string& note);
+                                       std::span<const PairCorrelation> largest, std::string_view file);
 
 /// A correlation matrix as lines of text: the table of up to kMostShownParameters; of more the largestEntries() alone
 /// and the name of the `file` that has all.

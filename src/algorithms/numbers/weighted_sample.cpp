@@ -72,10 +72,13 @@ SampleSummary summariseWeighted(std::span<const double> values, std::span<const 
   return summary;
 }
 
-std::vector<std::vector<double>> weightedCorrelations(std::span<const std::vector<double>> columns,
-                                                      std::span<const double> weights) {
+namespace {
+
+/// (x - mean) sqrt(weight) of each column, of length 1; NaN where it is constant.
+std::vector<std::vector<double>> scaledColumns(std::span<const std::vector<double>> columns,
+                                               std::span<const double> weights) {
   const double sum = std::accumulate(weights.begin(), weights.end(), 0.0);
-  std::vector<std::vector<double>> scaled;  // (x - mean) sqrt(weight), of length 1
+  std::vector<std::vector<double>> scaled;
   for (const std::vector<double>& column : columns) {
     double mean = 0.0;
     for (std::size_t i = 0; i < column.size(); ++i) mean += weights[i] / sum * column[i];
@@ -89,6 +92,19 @@ std::vector<std::vector<double>> weightedCorrelations(std::span<const std::vecto
     for (double& value : one) value = isConstant ? kNoValue : value / length;
     scaled.push_back(std::move(one));
   }
+  return scaled;
+}
+
+}  // namespace
+
+std::vector<PairCorrelation> largestWeightedCorrelations(std::span<const std::vector<double>> columns,
+                                                         std::span<const double> weights) {
+  return largestCorrelations(SampleCorrelations::ofScaled(scaledColumns(columns, weights)), kMostLargeCorrelations);
+}
+
+std::vector<std::vector<double>> weightedCorrelations(std::span<const std::vector<double>> columns,
+                                                      std::span<const double> weights) {
+  const std::vector<std::vector<double>> scaled = scaledColumns(columns, weights);
   std::vector<std::vector<double>> matrix(columns.size(), std::vector<double>(columns.size(), 1.0));
   for (std::size_t i = 0; i < columns.size(); ++i) {
     for (std::size_t j = 0; j < i; ++j) {

@@ -41,6 +41,9 @@ SampleSummary summariseWeighted(std::span<const double> values, std::span<const 
 /// The correlation matrix of the columns of a weighted sample, as correlationMatrix(); NaN for a constant column.
 std::vector<std::vector<double>> weightedCorrelations(std::span<const std::vector<double>> columns,
                                                       std::span<const double> weights);
+/// The largest of them, as largestCorrelations(), without the matrix: kMostLargeCorrelations.
+std::vector<PairCorrelation> largestWeightedCorrelations(std::span<const std::vector<double>> columns,
+                                                         std::span<const double> weights);
 
 /// How many values of equal weight tell as much of a mean as these: 1 / sum of the squared weights, whose sum is 1
 /// (Kish 1965); 0 if all weights are 0.

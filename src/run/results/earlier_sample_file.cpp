@@ -1,6 +1,7 @@
 #include "run/results/earlier_sample_file.h"
 
 #include <algorithm>
+#include <filesystem>
 #include <memory>
 #include <optional>
 #include <string_view>
@@ -137,18 +138,33 @@ ResultRows readRows(const std::string& file, const std::string& text, const RunC
                              "whose header row is\n   {}",
                              resultHeader(columns)));
   }
-  const RowChecksums checksums =
-      readRowChecksums(readFileIfThere(pathBesideResults(file, run_files::kPlain.checksums)).value_or(""));
+  const std::string checksumFile = pathBesideResults(file, run_files::kPlain.checksums);
+  const RowChecksums checksums = readRowChecksums(readFileIfThere(checksumFile).value_or(""));
   std::vector<std::string> faults;
   for (const RowFault& fault : checkRows(rows, checksums, config, RowOrigin::perhapsOther).faults) {
     if (checksums.has(fault.number)) faults.push_back(rowFaultText(fault));
   }
-  if (!faults.empty()) refuse(file, "it has rows that do not hold:" + listOf(faults));
+  if (!faults.empty()) {
+    refuse(file, fmt::format("it has rows that do not hold:{}\nRestore these lines from a copy, or delete them: their "
+                             "evaluations are then left out. If the rows are right and {} is not, remove that file",
+                             listOf(faults), checksumFile));
+  }
   if (table.unusableLines > 0) {
     found.warnings.push_back(
         fmt::format("Lines of {} that are cut off or damaged are passed over: {}", file, table.unusableLines));
   }
   rows.putInOrder();
+  std::ptrdiff_t missing = 0;
+  for (int last = 0; const RowChecksum& one : checksums) {  // an evaluation may have several
+    if (one.number != last && one.number >= 1 && !rows.has(one.number)) ++missing;
+    last = one.number;
+  }
+  if (missing > 0) {
+    found.warnings.push_back(fmt::format(
+        "{} of {} evaluations are missing in {}, though {} has their checksums: it was cut off or lines were deleted. "
+        "What is said of the sample is said of the {} that are there",
+        missing, missing + std::ssize(rows), file, fileNameOf(checksumFile), std::ssize(rows)));
+  }
   // A sample draws a likely set more than once, and its weight is as often counted; so is that of a set that somebody
   // gave more than once. A search has a set again where it
   // has converged, which says nothing of the set.
@@ -172,14 +188,32 @@ void addRows(const ResultRows& rows, EvaluatedSample& sample) {
 void openValues(const std::string& resultFile, const ResultRows& rows, const RunConfig& config,
                 std::span<const ObservedSeries> observed, EarlierSample& found) {
   const std::string path = pathBesideResults(resultFile, run_files::kPlain.simulatedValues);
+  std::error_code ignored;
+  if (!std::filesystem::exists(path, ignored)) {
+    found.warnings.push_back(fmt::format(
+        "There are no bands: {} is not there. Uncertainty, Sobol' and local sensitivity analyses keep the simulated "
+        "values in it",
+        path));
+    return;
+  }
   const auto times = config.task->keptSteps() ? std::optional(checksumOfTimes(observed)) : std::nullopt;
-  const auto values = std::make_shared<SimulatedValuesFile>(
-      path, simulatedValueCount(observed, SeriesPrecision::single), SeriesPrecision::single, 0, true, times);
-  const std::optional<std::size_t> count = values->openToRead(rows);
+  std::shared_ptr<SimulatedValuesFile> values;
+  std::optional<std::size_t> count;
+  auto precision = SeriesPrecision::single;
+  // Which task it was, and so what it has of each evaluation, is known by the file alone.
+  for (const SeriesPrecision kept : {SeriesPrecision::single, SeriesPrecision::exact}) {
+    for (const std::size_t measureCount : {std::size_t{0}, config.measures.size()}) {
+      if (count) break;
+      precision = kept;
+      values = std::make_shared<SimulatedValuesFile>(path, simulatedValueCount(observed, kept), kept, measureCount,
+                                                     true, times);
+      count = values->openToRead(rows);
+    }
+  }
   if (!count) {
     found.warnings.push_back(fmt::format(
-        "There are no bands: {} is not there, or has the simulated values at other times than this setup asks for "
-        "(Band_Times, Band_End_Date, the observations)",
+        "There are no bands: {} has the simulated values at other times than this setup asks for (Band_Times, "
+        "Band_End_Date, the observations)",
         path));
     return;
   }
@@ -189,8 +223,14 @@ void openValues(const std::string& resultFile, const ResultRows& rows, const Run
                                          path, succeeded - *count, succeeded));
     return;
   }
-  found.simulatedColumns = [values](std::span<const int> numbers, std::size_t first, std::size_t length) {
-    return values->columns(numbers, first, length);
+  std::vector<std::size_t> ends;  // of the series; in exact files units follow the values of each
+  for (const ObservedSeries& series : observed) {
+    ends.push_back(series.values.size() + (ends.empty() ? 0 : ends.back()));
+  }
+  if (precision == SeriesPrecision::single) ends.clear();
+  found.simulatedColumns = [values, ends](std::span<const int> numbers, std::size_t first, std::size_t length) {
+    const auto after = std::ranges::upper_bound(ends, first);
+    return values->columns(numbers, first + (after == ends.begin() ? 0 : *(after - 1)), length);
   };
 }
 

@@ -178,7 +178,9 @@ void RunResults::close() {
 void RunResults::writeTables(std::span<const DataTable> tables, RunLog& log) const {
   for (const DataTable& table : tables) {
     const std::string path = runFilePath(filePrefix_, table.file);
-    const auto content = [&] { return [parts = DataTableParts(table, tableHead_)]() mutable { return parts.next(); }; };
+    std::vector<std::string> head = tableHead_;
+    head.push_back(rowCountLine(table));
+    const auto content = [&] { return [parts = DataTableParts(table, head)]() mutable { return parts.next(); }; };
     if (hasContent(path, content())) continue;  // of a run that is walked through again
     keepEarlierFile(path, log);
     std::string reason;

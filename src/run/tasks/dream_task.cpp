@@ -178,7 +178,8 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   const std::vector<std::vector<double>> prior = target_->priorDraws(
       context.feasibility,
       std::clamp(kMostPriorValues / std::max<std::size_t>(dimensions.names.size(), 1), kLeastPriorDraws, kPriorDraws));
-  const auto summary = summarisePosterior(*sampler_, dimensions, prior);
+  const auto summary =
+      summarisePosterior(*sampler_, dimensions, prior, static_cast<std::size_t>(std::max(settings.matrixLimit, 0)));
   const std::string correlationFile = fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation));
   outcome.report = formatPosterior(dream.sampler, *sampler_, dimensions, summary ? &*summary : nullptr,
                                    target_->failures(), correlationFile);
@@ -194,8 +195,7 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   outcome.tables.push_back(posteriorTable(*summary, dimensions));
   outcome.tables.push_back(marginalsTable(*sampler_, dimensions, prior));
   outcome.tables.push_back(convergenceTable(*sampler_, dimensions));
-  outcome.tables.push_back(matrixTable(run_files::kSampleCorrelation, "Correlation of the posterior", dimensions.names,
-                                       summary->correlations));
+  outcome.tables.push_back(posteriorCorrelationTable(*summary, dimensions));
   const std::vector<std::string> bands =
       reportPosteriorBands(context, *target_, *sampler_, keptSteps().has_value(), randomSeed, outcome.files);
   outcome.report.emplace_back();

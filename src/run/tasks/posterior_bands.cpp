@@ -8,6 +8,7 @@
 
 #include "algorithms/analyses/series_band.h"
 #include "common/run_files.h"
+#include "common/text.h"
 
 namespace mirevo {
 namespace {
@@ -65,6 +66,23 @@ class BandReport {
     lines.push_back(coverageText(title, band.coverage));
     addUnused(observed, title, band);
     lines.push_back("   " + files_.back().path);
+    if (const std::string fewer = fewerRunsText(band); !fewer.empty()) {
+      lines.push_back("   " + fewer);
+      context_.log.warning(fmt::format("{}: {}", title, fewer));
+    }
+  }
+
+  /// Says at how many times of a series states have a value without errors.
+  void addTimesWithoutErrors(const std::string& name, std::size_t count) {
+    if (count == 0) return;
+    const std::string text = fmt::format(
+        "at {} model runs have values that the Box-Cox transformation gives no errors, zeros with a lambda of at most "
+        "0 "
+        "or negative ones: the band has the zeros as they are, and lacks the others. A larger Box_Cox_Shift gives them "
+        "errors",
+        countText(count, "time"));
+    lines.push_back(fmt::format("   {}", text));
+    context_.log.warning(fmt::format("Band of total uncertainty of {}: {}", name, text));
   }
 
   std::vector<std::string> lines;
@@ -117,15 +135,21 @@ std::vector<std::string> reportPosteriorBands(const TaskContext& context, const 
         paths.emplace_back(series->errors, target.errorsOf(*series, state.point));
       }
       ChainRandom random(seed, k + 1);
+      std::size_t withoutErrors = 0;  // times
       const auto observable = [&](std::size_t index, std::size_t count) {
         std::vector<double> values = simulated(index, count);
+        bool hasErrors = true;
         for (std::size_t i = 0; i < values.size(); ++i) {
-          values[i] = paths[i % stateCount].next(index + i / stateCount, values[i], random);
+          SeriesErrors::Path& path = paths[i % stateCount];
+          hasErrors = (i % stateCount == 0 || hasErrors) && path.hasErrors(values[i]);
+          values[i] = path.next(index + i / stateCount, values[i], random);
+          if (i % stateCount == stateCount - 1 && !hasErrors) ++withoutErrors;
         }
         return values;
       };
       report.add(observed, run_files::kTotalBand, "Band of total uncertainty",
                  seriesBand(observed.values, stateCount, observable));
+      report.addTimesWithoutErrors(context.measures[observed.measure].name, withoutErrors);
     }
     first += 2 * observed.values.size();
   }

@@ -227,7 +227,13 @@ TEST(GlueSummary, ComparesTheBehaviouralWithTheDrawnParameters) {
   EXPECT_LT(summary.parameters[1].distance, summary.distanceLimit);
   EXPECT_NEAR(summary.distanceLimit, 1.358 * std::sqrt(1.0 / 401.0 + 1.0 / 1000.0), 1e-12);
   EXPECT_LT(std::abs(summary.correlations[0][1]), 0.1);
-  EXPECT_TRUE(summariseGlue(sample, weights, 1).correlations.empty()) << "too many parameters";
+  const GlueSummary large = summariseGlue(sample, weights, 1);  // too many parameters for a matrix
+  EXPECT_TRUE(large.correlations.empty());
+  ASSERT_EQ(large.largestCorrelations.size(), 1U);
+  EXPECT_NEAR(large.largestCorrelations[0].value, summary.correlations[0][1], 1e-12);
+  const AnalysisNames names{{"a", "b"}, {"m"}, {"o"}, {}};
+  const auto tables = glueTables(sample, weights, large, judgeOf(measure), settings, names);
+  EXPECT_EQ(tables[1].columns, (std::vector<std::string>{"First", "Second", "Correlation"}));
 }
 
 TEST(WeightedBand, IsOfTheWeightedQuantilesAndTellsItsWidth) {

@@ -155,6 +155,10 @@ TEST(DistributionWarnings, AreOfMeansOutsideTheBoundsAndOfMostValuesThere) {
       distributionWarnings(distributions, space),
       ElementsAre("Mean_Value of PARAMETER_1 (a) is 3, on the model scale 20.0855: outside the bounds 0.5 to 4; "
                   "the mean of a logarithmic parameter is that of its natural logarithm, ln(3) = 1.09861"));
+
+  const SearchSpace equal{.names = {"x"}, .lower = {0.5}, .upper = {0.5}, .transformation = {TransformationType::none}};
+  EXPECT_THAT(distributionWarnings(ParameterDistributions(std::vector{uniformDistribution(0.5, 0.5)}), equal),
+              ElementsAre("x has one value alone, 0.5, and is not varied: its bounds are equal"));
 }
 
 }  // namespace

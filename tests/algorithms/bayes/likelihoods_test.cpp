@@ -157,6 +157,48 @@ TEST(Likelihoods, ARunWithoutAValueThatTheFirstOneHadHasNone) {
             -std::numeric_limits<double>::infinity());
 }
 
+TEST(Likelihoods, OfASimulatedZeroIsTheOneThatDrawsFromItHave) {
+  struct Case {
+    double simulated;
+    double lambda;
+    double shift;
+    bool isPossible;  ///< an observation of 1
+    double drawn;     ///< NaN: no value; infinity: not always the same
+  };
+  const double infinity = std::numeric_limits<double>::infinity();
+  const Case cases[] = {
+      {0.0, 0.5, 0.0, true, infinity}, {0.0, 0.3, 0.0, true, infinity},   {0.0, 1.0, 0.0, true, infinity},
+      {0.0, 0.0, 0.0, false, 0.0},     {0.0, -0.5, 0.0, false, 0.0},      {-0.2, 0.0, 0.2, false, -0.2},
+      {0.0, 0.0, 0.2, true, infinity}, {-0.1, 0.5, 0.0, false, kMissing}, {-0.1, 0.0, 0.0, false, kMissing},
+  };
+  for (const auto& [simulated, lambda, shift, isPossible, drawn] : cases) {
+    SCOPED_TRACE(::testing::Message() << simulated << " " << lambda << " " << shift);
+    const SeriesErrors series(LikelihoodForm::boxCox, shift, std::vector{0.0}, std::vector{1.0});
+    const ErrorValues values = errors({{kDeviation, 0.8}, {kLambda, lambda}});
+    const double found = series.logLikelihood(std::vector{simulated}, values);
+    EXPECT_EQ(std::isfinite(found), isPossible);
+    if (isPossible && lambda < 1.0 && lambda > 0.0) {
+      // T(1) = 0 and T(0) = -1 / lambda; the Jacobian of 1 is 1.
+      EXPECT_NEAR(found, lnNormal(1.0 / lambda, 0.8), 1e-12);
+    }
+    ChainRandom random(5);
+    SeriesErrors::Path path(series, values);
+    EXPECT_EQ(path.hasErrors(simulated), std::isinf(drawn));
+    const double first = path.next(0, simulated, random);
+    const double second = SeriesErrors::Path(series, values).next(0, simulated, random);
+    if (std::isinf(drawn)) {
+      EXPECT_TRUE(std::isfinite(first));
+      EXPECT_TRUE(std::isfinite(second));
+    } else {
+      EXPECT_EQ(std::isnan(first), std::isnan(drawn));
+      if (!std::isnan(drawn)) {
+        EXPECT_EQ(first, drawn);
+        EXPECT_EQ(second, drawn);
+      }
+    }
+  }
+}
+
 TEST(Likelihoods, PathsOfObservableValuesHaveTheModelsSpread) {
   // Box-Cox with lambda 0, correlated: ln y ~ N(ln f, 0.2^2 / (1 - phi^2)) at every time.
   const std::vector<double> days{0.0, 1.0, 2.0, 5.0};

@@ -36,7 +36,7 @@ struct ShownChains {
 // A proposal that was rejected is in no row, its state is there once more; the rate is of proposals that became states.
 TEST(Posterior, IsOfTheStatesBehindBurnInAndTheAcceptanceRateOfTheirProposals) {
   const ShownChains shown;
-  const auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior);
+  const auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior, 1000);
   ASSERT_TRUE(summary);
   const DataTable table = chainsTable(*shown.chains, shown.dimensions);
   std::size_t rows = 0;
@@ -77,7 +77,7 @@ TEST(Posterior, IsSaidNotToBeThereOrNotToHaveConverged) {
   const std::vector<std::string> none = shown.report(nullptr, 1);
   EXPECT_THAT(none, ::testing::Contains(::testing::StartsWith("1 model run failed or had no likelihood")));
   EXPECT_THAT(none, ::testing::Contains(::testing::HasSubstr("No posterior: there are fewer than 4 generations")));
-  auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior);
+  auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior, 1000);
   EXPECT_THAT(shown.report(&*summary), ::testing::Contains(::testing::HasSubstr("The chains have converged")));
   summary->dimensions[1].rHat = 1.3;
   EXPECT_THAT(
@@ -100,6 +100,24 @@ TEST(Posterior, IsSaidNotToBeThereOrNotToHaveConverged) {
     }
     EXPECT_EQ(verdicts, 1);
   }
+}
+
+TEST(Posterior, OfManyDimensionsHasTheLargestCorrelationsAndSaysNothingOfParametersWhileChainsAreApart) {
+  ShownChains shown;
+  const auto matrix = summarisePosterior(*shown.chains, shown.dimensions, shown.prior, 2);
+  auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior, 1);
+  EXPECT_TRUE(matrix->largestCorrelations.empty());
+  EXPECT_TRUE(summary->correlations.empty());
+  ASSERT_EQ(summary->largestCorrelations.size(), 1U);
+  EXPECT_EQ(summary->largestCorrelations[0].value, matrix->correlations[0][1]);
+  const DataTable table = posteriorCorrelationTable(*summary, shown.dimensions);
+  EXPECT_EQ(table.columns, (std::vector<std::string>{"First", "Second", "Correlation"}));
+  EXPECT_EQ(table.rows.size(), 1U);
+  summary->largestCorrelations[0].value = 0.9;
+  const auto tradeOff = ::testing::Contains(::testing::HasSubstr("trade off: a correlation of 0.90"));
+  EXPECT_THAT(shown.report(&*summary), tradeOff);
+  summary->dimensions[0].rHat = 1.4;
+  EXPECT_THAT(shown.report(&*summary), ::testing::Not(tradeOff));
 }
 
 }  // namespace

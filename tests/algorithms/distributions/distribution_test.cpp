@@ -120,6 +120,47 @@ TEST(Distribution, OfAnIntegerGivesEachValueTheWidthOfOne) {
   EXPECT_THAT(counts, ::testing::ElementsAre(0, 1000, 1000, 1000, 1000, 1000, 1000, 0));
 }
 
+TEST(Distribution, OfAnIntegerDrawsSingleValuesBetweenTwoIntegersAsItsDensityHasThem) {
+  const double values[] = {1, 2.5, 4.5, 5};
+  const double weights[] = {1, 1, 1, 1};
+  const DistributionPointer halves = onGridOf(1, discreteDistribution(values, weights));
+  std::vector<double> counts(7);
+  for (int i = 0; i < 400; ++i) ++counts[static_cast<std::size_t>(halves->quantile((i + 0.5) / 400))];
+  EXPECT_THAT(counts, ::testing::ElementsAre(0, 100, 100, 0, 100, 100, 0));
+  for (std::size_t value = 0; value < counts.size(); ++value) {
+    EXPECT_EQ(std::exp(halves->logDensity(static_cast<double>(value) + 0.5)), counts[value] / 400) << value;
+  }
+}
+
+TEST(Distribution, OfALimitWithAPoleHasTheDensityOfTheValuesThatAreRoundedToIt) {
+  struct Case {
+    double alpha;
+    double beta;
+    double minimum;
+    double maximum;
+    double limit;
+    double rounded;  ///< how far from the limit values are rounded to it
+  };
+  const double unit = std::numeric_limits<double>::epsilon();
+  const Case cases[] = {{0.1, 1, 5, 6, 5, 2 * unit},
+                        {0.1, 1, -6, -5, -6, 2 * unit},
+                        {1, 0.1, 5, 6, 6, 2 * unit},
+                        {1, 0.5, 999, 1000, 1000, 256 * unit},
+                        {0.2, 1, 1024, 4096, 1024, 512 * unit}};
+  for (const auto& [alpha, beta, minimum, maximum, limit, rounded] : cases) {
+    const DistributionPointer distribution = betaDistribution(alpha, beta, minimum, maximum);
+    // One shape is 1: the probability of these values is the share of the range to the power of the other.
+    const double pole = std::min(alpha, beta);
+    const double share = rounded / (maximum - minimum);
+    EXPECT_NEAR(std::exp(distribution->logDensity(limit)), pole * std::pow(share, pole) / rounded,
+                1e-6 * std::pow(share, pole) / rounded)
+        << limit;
+  }
+  // At 0 numbers are as small as they come.
+  EXPECT_NEAR(betaDistribution(0.5, 1, 0, 1)->logDensity(0.0),
+              -0.5 * std::log(std::numeric_limits<double>::min()) - std::log(2.0), 1e-9);
+}
+
 TEST(Distribution, OfValuesKeepsTheirProbabilities) {
   const double values[] = {5, 1, 3, 1};
   const double weights[] = {2, 1, 0, 1};

@@ -380,6 +380,7 @@ test('chains say whether they have converged, what to do, which parameters trade
     assert.deepEqual(shaded, [24, 24, 24, 24, 24], 'the burn-in of each trace');
     const limits = await page.$$eval('#posterior figure', (figures) => figures.map((figure) => window.drawnOptions(figure)?.series[0].markLine?.data?.[0]?.yAxis).filter((limit) => limit));
     assert.deepEqual(limits, [1.05, 400]);
+    assert.ok(!shown.includes('The data have narrowed'), 'what chains that are apart have not found');
   });
   Object.assign(data.posterior, { state: 'reached', findings: ['The chains have converged'], advice: [], tradeOffs: [] });
   Object.assign(data.band[1], { inside: 0.91 });
@@ -389,6 +390,12 @@ test('chains say whether they have converged, what to do, which parameters trade
     assert.equal(await page.locator('#posterior .findings .good').count(), 1);
     for (const text of ['about the 90 % that it should', 'No two parameters trade off', 'The data have narrowed \u2068a\u2069 most: its 5 to 95 % range is 30 %', 'They say little of \u2068b\u2069']) assert.ok(shown.includes(text), text);
     assert.ok(!shown.includes('not the posterior yet'));
+  });
+  data.band.push({ ...data.band[1], inside: 0.8, n: 1000 });
+  Object.assign(data.band[1], { inside: 0.8, n: 10 });
+  await withReport(data, {}, async (page) => {
+    const shown = await page.locator('#posterior').textContent();
+    for (const text of ['holds 80 % of 10 observed values; it should hold about 90 %, but of so few values this may be chance', 'holds 80 % of 1\u202f000 observed values; it should hold about 90 %. It is too narrow']) assert.ok(shown.includes(text), text);
   });
 });
 

@@ -15,6 +15,7 @@ const kMostLines = 8; // dimensions with a line of their own
 const kMostGrown = 60; // dimensions with charts of their own
 const kWanted = 0.9; // share of what is observed that a band of everything should hold
 const kAround = 0.05;
+const kChance = 0.025; // a share farther from it than would come by chance so often, on either side, is told
 
 const sentence = (text: string) => (/[.!?]$/.test(text) ? text : `${text}.`);
 
@@ -96,13 +97,15 @@ function knownTable({ dimensions }: Posterior): Node {
   return table(columns, rows, 'Parameters before and after the observations');
 }
 
-function whatIsTold({ dimensions }: Posterior): string {
+// Nothing while chains are at different places.
+function whatIsTold({ dimensions, state }: Posterior): string {
+  if (state === 'apart') return '';
   const known = dimensions.filter(({ narrowing, isOfErrors }) => narrowing !== null && !isOfErrors).sort((a, b) => a.narrowing! - b.narrowing!);
   if (known.length === 0) return '';
   const [best] = known;
   const little = known.filter(({ isHardlyNarrower }) => isHardlyNarrower).map(({ name }) => isolated(name));
   return `The data have narrowed ${isolated(best!.name)} most: its 5 to 95 % range is ${percent(best!.narrowing, 2)} of that of its prior.${
-    little.length > 0 ? ` They say little of ${little.join(', ')}, whose posterior is hardly narrower than its prior: such a parameter can be fixed, or needs other observations.` : ''}`;
+    little.length > 0 ? ` They say little of ${little.join(', ')}, whose posterior is hardly narrower than its prior: these observations do not tell ${little.length > 1 ? 'their values' : 'its value'}. Where such a parameter trades off with another, a combination of both may still be known well, and fixing it makes the other look surer than it is; one that trades off with none can be fixed.` : ''}`;
 }
 
 function marginalPlan(of: PosteriorDimension): ChartPlan {
@@ -203,7 +206,7 @@ function pairContent(posterior: Posterior): Node[] {
   const plots = pairPlots(dimensions, correlations);
   if (plots.length === 0) return [];
   const names = dimensions.map(({ name }) => name);
-  const told = tradeOffs && correlations.length > 0
+  const told = tradeOffs && (correlations.length > 0 || tradeOffs.length > 0)
     ? tradeOffs.length > 0 ? make('ul', { class: 'findings' }, ...tradeOffs.map((text) => finding(text, ''))) : paragraph('No two parameters trade off: no correlation of the posterior is as large as 0.7.')
     : null;
   return [
@@ -214,6 +217,17 @@ function pairContent(posterior: Posterior): Node[] {
   ];
 }
 
+/** The probability of at most `most` of `n` observed values within a band that holds each with the probability kWanted. */
+function atMost(most: number, n: number): number {
+  let logarithm = n * Math.log(1 - kWanted);
+  let sum = 0;
+  for (let k = 0; k <= most; k++) {
+    sum += Math.exp(logarithm);
+    logarithm += Math.log(((n - k) / (k + 1)) * (kWanted / (1 - kWanted)));
+  }
+  return sum;
+}
+
 /** How many of the observed values a band of everything holds, against how many it should. */
 function coverageText(band: Band, isConverged: boolean): string {
   const inside = band.inside;
@@ -221,6 +235,9 @@ function coverageText(band: Band, isConverged: boolean): string {
   const name = isolated(band.measure);
   const held = `The band of what would be observed of ${name} holds ${percent(inside)} of ${band.n === null ? 'the' : count(band.n)} observed values`;
   const hint = isConverged ? '' : ' The chains have not converged, which may be the reason.';
+  const far = Math.abs(inside - kWanted) > kAround;
+  const least = band.n === null ? 0 : inside < kWanted ? atMost(Math.round(inside * band.n), band.n) : 1 - atMost(Math.round(inside * band.n) - 1, band.n);
+  if (far && least > kChance) return `${held}; it should hold about 90 %, but of so few values this may be chance.`;
   if (inside < kWanted - kAround) return `${held}; it should hold about 90 %. It is too narrow: errors are larger, or have heavier tails, than the likelihood has them.${hint}`;
   if (inside > kWanted + kAround) return `${held}; it should hold about 90 %. It is wider than it need be: the likelihood has larger errors than there are, and another form of it may fit better.${hint}`;
   return `${held}, about the 90 % that it should.`;
