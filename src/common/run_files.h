@@ -102,10 +102,6 @@ inline constexpr RunFile kPareto{"_Pareto", ".dat", false, true};
 inline constexpr RunFile kParetoCourse{"_ParetoCourse", ".dat", false, true};
 inline constexpr RunFile kParetoSeries{"_ParetoSeries", ".dat", false, true};
 
-/// Those of a search that is repeated with other seeds.
-inline constexpr RunFile kRepetitions{"_Optimisation_Repetitions", ".dat", false, true};
-inline constexpr RunFile kRepetitionRows{"_Optimisation_RepetitionRows", ".dat", false, true};
-
 /// What all tasks call alike behind their own stem.
 constexpr RunFile restartFile(std::string_view stem) {
   return {.stem = stem, .extension = ".dat", .mark = "# What the results beside this file depend on"};

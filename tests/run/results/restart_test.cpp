@@ -80,23 +80,6 @@ TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDef
   EXPECT_THAT(changedSettings(then, now), IsEmpty());
 }
 
-TEST_F(RestartSettingsTest, EachLineOfARepeatedKeywordIsHeldAgainstItsOwn) {
-  const std::pair<std::vector<const char*>, std::vector<std::string>> cases[] = {
-      {{"'g1: a, b'", "'g2: c, d'"}, {}},
-      {{"'g1: a'", "'g2: c, d'"}, {"Group of SOBOL: 'g1: a, b' then, 'g1: a' now"}},
-      {{"'g2: c, d'"},
-       {"Group of SOBOL: 'g1: a, b' then, 'g2: c, d' now", "Group of SOBOL: 'g2: c, d' then, absent now"}},
-      {{"'g1: a, b'", "'g2: c, d'", "'g3: e'"}, {"Group of SOBOL: absent then, 'g3: e' now"}},
-  };
-  const auto settingsOf = [](const std::vector<const char*>& groups) {
-    RestartSettings settings;
-    for (const char* group : groups) settings.settings.push_back({"SOBOL", "Group", group});
-    return settings;
-  };
-  const auto then = parseRestartSettings(formatRestartSettings(settingsOf({"'g1: a, b'", "'g2: c, d'"})));
-  for (const auto& [groups, expected] : cases) EXPECT_EQ(changedSettings(*then, settingsOf(groups)), expected);
-}
-
 TEST_F(RestartSettingsTest, ALaterVersionIsToldByItsNumbers) {
   for (const char* version : {"99.0.0", "0.99.0-rc1", "99"}) EXPECT_TRUE(isLaterVersion(version)) << version;
   for (const char* version : {"", "0.1.99", "0.2.0", "x", ".", "99999999999.0.0"}) {
