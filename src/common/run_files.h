@@ -91,8 +91,15 @@ inline constexpr RunFile kEstimateCovariance{"_Optimisation_Covariance", ".dat",
 inline constexpr RunFile kEstimateCorrelation{"_Optimisation_Correlation", ".dat", false, true};
 inline constexpr RunFile kEstimateLimits{"_Optimisation_ParameterLimits", ".dat", false, true};
 inline constexpr RunFile kEstimateJacobian{"_Optimisation_Jacobian", ".dat", false, true};
-inline constexpr std::array kEstimateTables{kEstimateCovariance, kEstimateCorrelation, kEstimateLimits,
-                                            kEstimateJacobian};
+
+/// Those of a search that finds a front; the last one is no table of common/data_table alone, but in the form of
+/// kScenarioSeries.
+inline constexpr RunFile kPareto{"_Pareto", ".dat", false, true};
+inline constexpr RunFile kParetoCourse{"_ParetoCourse", ".dat", false, true};
+inline constexpr RunFile kParetoSeries{"_ParetoSeries", ".dat", false, true};
+inline constexpr std::array kOptimisationTables{
+    kEstimateCovariance, kEstimateCorrelation, kEstimateLimits, kEstimateJacobian, kPareto,
+    kParetoCourse,       kParetoSeries};
 
 /// What all tasks call alike behind their own stem.
 constexpr RunFile restartFile(std::string_view stem) {
@@ -119,7 +126,7 @@ inline constexpr ResultFileNames kSensitivity{
 inline constexpr ResultFileNames kOptimisation{
     {"_Optimisation", ".dat"},           restartFile("_Optimisation_Restart"), simulatedFile("_Optimisation_Simulated"),
     {"_Optimisation_Run", ".dat"},       {"_Optimisation_Failures", ".dat"},   {"_Optimisation_Pairs", ".dat"},
-    {"_Optimisation_Checksums", ".dat"}, {"_Optimisation_NotKept", ".dat"},    kEstimateTables};
+    {"_Optimisation_Checksums", ".dat"}, {"_Optimisation_NotKept", ".dat"},    kOptimisationTables};
 
 inline constexpr std::string_view kFailuresMark = "# Failed evaluations of ";
 /// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another
