@@ -67,7 +67,7 @@ class Pareto : public ::testing::Test {
   std::string setup_;
 };
 
-double numberIn(const ReadTable& table, const std::vector<std::string>& row, const std::string& column) {
+double numberInRow(const ReadTable& table, const std::vector<std::string>& row, const std::string& column) {
   return realCell(row.at(table.column(column).value())).value();
 }
 
@@ -86,19 +86,19 @@ TEST_F(Pareto, TheFrontIsTheLineBetweenTheTwoSetsAndItsSeriesAreThoseOfItsSets) 
     int suggested = 0;
     double before = -1.0;
     for (const auto& row : table.rows) {
-      const double fit = numberIn(table, row, "fit");
-      const double other = numberIn(table, row, "other");
-      if (numberIn(table, row, "Rank") > 1.0) continue;
+      const double fit = numberInRow(table, row, "fit");
+      const double other = numberInRow(table, row, "other");
+      if (numberInRow(table, row, "Rank") > 1.0) continue;
       EXPECT_GE(fit + other, distance - 1e-5);
       EXPECT_LT(fit + other, 1.35 * distance);
       EXPECT_GT(fit, before) << "sorted";
       before = fit;
-      EXPECT_EQ(numberIn(table, row, "Violation"), 0.0);
-      if (numberIn(table, row, "Suggested") == 0.0) continue;
+      EXPECT_EQ(numberInRow(table, row, "Violation"), 0.0);
+      if (numberInRow(table, row, "Suggested") == 0.0) continue;
       ++suggested;
       // The final model run is that of the suggested set.
       const std::string parameters = folder_.read("basin_Process1/parameters.txt");
-      EXPECT_NEAR(std::strtod(parameters.c_str() + parameters.find("a = ") + 4, nullptr), numberIn(table, row, "a"),
+      EXPECT_NEAR(std::strtod(parameters.c_str() + parameters.find("a = ") + 4, nullptr), numberInRow(table, row, "a"),
                   1e-6);
     }
     EXPECT_EQ(suggested, 1);
@@ -115,7 +115,7 @@ TEST_F(Pareto, TheFrontIsTheLineBetweenTheTwoSetsAndItsSeriesAreThoseOfItsSets) 
       const auto of = std::ranges::find_if(table.rows, [&](const auto& each) { return each[0] == row[0]; });
       ASSERT_NE(of, table.rows.end()) << row[0];
       const double expected =
-          numberIn(table, *of, "a") + numberIn(table, *of, "b") * std::sin(day / 58.0) + day / 365.0;
+          numberInRow(table, *of, "a") + numberInRow(table, *of, "b") * std::sin(day / 58.0) + day / 365.0;
       ASSERT_NEAR(realCell(row[3]).value(), expected, 1e-4) << row[0] << " " << row[2];
     }
     ASSERT_FALSE(steps.empty());

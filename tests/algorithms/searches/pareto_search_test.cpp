@@ -41,13 +41,13 @@ const MultiObjectiveFunction& functionOf(const std::string& name) {
 }
 
 /// A search by its name, with what it found.
-struct Found {
+struct FoundFront {
   SearchSummary summary;
   ParetoProblem pareto;
   std::vector<ParameterSet> sets;  ///< in the order of their evaluations
 };
 
-struct Case {
+struct FrontCase {
   std::string search = "NSGA-II";
   std::string function = "ZDT1";
   int budget = 1000;
@@ -62,8 +62,8 @@ struct Case {
   std::function<std::optional<EvaluationResult>(const ParameterSet&)> instead = {};  ///< of the function's result
 };
 
-Found find(const Case& one) {
-  Found found;
+FoundFront findFront(const FrontCase& one) {
+  FoundFront found;
   const MultiObjectiveFunction& function = functionOf(one.function);
   FunctionEvaluator evaluator([&](const ParameterSet& set) {
     if (one.instead) {
@@ -89,7 +89,7 @@ Found find(const Case& one) {
   return found;
 }
 
-double volumeOf(const Found& found, std::size_t objectives) {
+double frontVolumeOf(const FoundFront& found, std::size_t objectives) {
   return hypervolume(found.pareto.archive.front(), std::vector<double>(objectives, 1.0));
 }
 
@@ -102,9 +102,9 @@ TEST(ParetoSearch, FrontsOfPublishedFunctionsAreFound) {
       {"PADDS", "ZDT1", 5000, 0.53},    {"PADDS", "ZDT2", 5000, 0.15},    {"PADDS", "ZDT3", 5000, 0.88},
       {"PADDS", "DTLZ2", 1500, 0.30}};
   for (const auto& [search, name, budget, least] : cases) {
-    const Found found = find({.search = search, .function = name, .budget = budget, .population = 100});
+    const FoundFront found = findFront({.search = search, .function = name, .budget = budget, .population = 100});
     const MultiObjectiveFunction& function = functionOf(name);
-    const double volume = volumeOf(found, function.objectives);
+    const double volume = frontVolumeOf(found, function.objectives);
     EXPECT_GT(volume, least) << search << " " << name;
     EXPECT_LE(volume, function.frontVolume + 1e-5) << search << " " << name << ": more than the front itself";
     EXPECT_EQ(found.summary.evaluationCount, budget);
@@ -115,14 +115,14 @@ TEST(ParetoSearch, FrontsOfPublishedFunctionsAreFound) {
 
 TEST(ParetoSearch, HypervolumeAtRestEndsTheSearch) {
   for (const char* search : {"NSGA-II", "PADDS"}) {
-    const Found found = find(
+    const FoundFront found = findFront(
         {.search = search, .budget = 20000, .pareto = {.hypervolumeEvaluations = 1000, .hypervolumeChange = 0.01}});
     EXPECT_EQ(found.summary.terminationMessage, kHypervolumeSettledMessage) << search;
     EXPECT_LT(found.summary.evaluationCount, 15000);
     EXPECT_GT(found.summary.evaluationCount, 1000);
     EXPECT_THAT(found.summary.notes.back(), HasSubstr("In the last 1000 evaluations"));
     // As far as it went it is the same search.
-    const Found whole = find({.search = search, .budget = search == std::string("PADDS") ? 20000 : 4000});
+    const FoundFront whole = findFront({.search = search, .budget = search == std::string("PADDS") ? 20000 : 4000});
     const std::size_t same = std::min<std::size_t>(found.sets.size(), whole.sets.size());
     EXPECT_TRUE(
         std::equal(found.sets.begin(), found.sets.begin() + static_cast<std::ptrdiff_t>(same), whole.sets.begin()));
@@ -135,13 +135,13 @@ TEST(ParetoSearch, FailedRunsAreNeverOnTheFrontAndDoNotStopIt) {
       if (std::fmod(set[1] * 1000.0, 1.0) < 0.3) return failedOfAll(2);
       return std::nullopt;
     };
-    const Found found = find({.search = search, .budget = 4000, .instead = fails});
+    const FoundFront found = findFront({.search = search, .budget = 4000, .instead = fails});
     EXPECT_EQ(found.pareto.archive.evaluationCount(), 4000);
-    EXPECT_GT(volumeOf(found, 2), 0.3) << search;
+    EXPECT_GT(frontVolumeOf(found, 2), 0.3) << search;
     for (const FrontMember& member : found.pareto.archive.members()) EXPECT_FALSE(fails(member.set));
-    const Found none = find({.search = search, .budget = 200, .instead = [](const ParameterSet&) {
-                               return std::optional(failedOfAll(2));
-                             }});
+    const FoundFront none = findFront({.search = search, .budget = 200, .instead = [](const ParameterSet&) {
+                                         return std::optional(failedOfAll(2));
+                                       }});
     EXPECT_TRUE(none.pareto.archive.members().empty());
     EXPECT_EQ(none.summary.evaluationCount, 200);
   }
@@ -157,8 +157,8 @@ TEST(ParetoSearch, ProposalsMeetTheConstraintsAndGivenSetsThatDoNotRankBehind) {
       if (holds(set)) return std::nullopt;
       return failedOfAll(2, EvaluationFailure::Kind::constraintsViolated);
     };
-    const Found found =
-        find({.search = search, .budget = 40, .feasibility = feasibility, .includesInitial = true, .instead = instead});
+    const FoundFront found = findFront(
+        {.search = search, .budget = 40, .feasibility = feasibility, .includesInitial = true, .instead = instead});
     EXPECT_FALSE(holds(found.sets.front())) << "the initial set is run as the setup gives it";
     for (std::size_t i = 1; i < found.sets.size(); ++i) EXPECT_TRUE(holds(found.sets[i])) << i;
     if (found.pareto.population.empty()) continue;
@@ -168,19 +168,19 @@ TEST(ParetoSearch, ProposalsMeetTheConstraintsAndGivenSetsThatDoNotRankBehind) {
 }
 
 TEST(ParetoSearch, SameSeedsGiveTheSameSearchWhateverTheBudgetOfNsgaII) {
-  const Found a = find({.budget = 330});
-  const Found b = find({.budget = 700});
+  const FoundFront a = findFront({.budget = 330});
+  const FoundFront b = findFront({.budget = 700});
   EXPECT_TRUE(std::equal(a.sets.begin(), a.sets.end(), b.sets.begin())) << "the last generation is cut";
-  EXPECT_NE(find({.budget = 330, .seed = 2}).sets, a.sets);
+  EXPECT_NE(findFront({.budget = 330, .seed = 2}).sets, a.sets);
   for (const ParameterSet& set : b.sets) EXPECT_THAT(set, Each(Ge(0.0)));
 }
 
 TEST(Padds, ARaisedBudgetBeginsAnewWithTheFrontAndKeepsTheEvaluations) {
-  const Found first = find({.search = "PADDS", .budget = 200, .candidates = 4});
-  const Found second = find({.search = "PADDS", .budget = 500, .candidates = 4, .earlier = {{200, 200}}});
+  const FoundFront first = findFront({.search = "PADDS", .budget = 200, .candidates = 4});
+  const FoundFront second = findFront({.search = "PADDS", .budget = 500, .candidates = 4, .earlier = {{200, 200}}});
   EXPECT_TRUE(std::equal(first.sets.begin(), first.sets.end(), second.sets.begin()));
   EXPECT_EQ(second.sets.size(), 500U);
-  const auto changes = [](const Found& found, std::size_t from, std::size_t to) {
+  const auto changes = [](const FoundFront& found, std::size_t from, std::size_t to) {
     double moved = 0.0;
     for (std::size_t i = from; i < to; ++i) {
       // From the nearest earlier set: how many parameters were perturbed.
@@ -200,7 +200,7 @@ TEST(Padds, ARaisedBudgetBeginsAnewWithTheFrontAndKeepsTheEvaluations) {
 
 TEST(Padds, EachWayToDrawFromTheFrontIsAnotherSearch) {
   const auto setsOf = [](PaddsSelection selection) {
-    return find({.search = "PADDS", .budget = 300, .selection = selection}).sets;
+    return findFront({.search = "PADDS", .budget = 300, .selection = selection}).sets;
   };
   EXPECT_NE(setsOf(PaddsSelection::hypervolume), setsOf(PaddsSelection::crowding));
   EXPECT_NE(setsOf(PaddsSelection::crowding), setsOf(PaddsSelection::random));
