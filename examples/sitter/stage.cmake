@@ -1,6 +1,6 @@
 set(stage ${CMAKE_CURRENT_BINARY_DIR}/sitter)
 set(staged)
-foreach(file sitter.kdx data/sitter_daily.csv data/PROVENANCE.md model/run.sh model/upper.tpl model/upper.txt model/lower.tpl
+foreach(file sitter.kdx two-gauges.kdx data/sitter_daily.csv data/PROVENANCE.md model/run.sh model/upper.tpl model/upper.txt model/lower.tpl
         model/lower.txt model/river.tpl model/river.txt)
   stage_file(${CMAKE_CURRENT_LIST_DIR}/${file} ${stage}/${file})
 endforeach()

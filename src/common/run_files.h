@@ -94,13 +94,15 @@ inline constexpr RunFile kEstimateJacobian{"_Optimisation_Jacobian", ".dat", fal
 /// Those of a search that is repeated.
 inline constexpr RunFile kRepetitions{"_Optimisation_Repetitions", ".dat"};
 inline constexpr RunFile kRepetitionRows{"_Optimisation_RepetitionRows", ".dat"};
-inline constexpr std::array kSearchTables{kEstimateCovariance, kEstimateCorrelation, kEstimateLimits,
-                                          kEstimateJacobian,   kRepetitions,         kRepetitionRows};
 
-/// Those of a search by several objectives.
+/// Those of a search that finds a front; the last one is no table of common/data_table alone, but in the form of
+/// kScenarioSeries.
 inline constexpr RunFile kPareto{"_Pareto", ".dat", false, true};
 inline constexpr RunFile kParetoCourse{"_ParetoCourse", ".dat", false, true};
 inline constexpr RunFile kParetoSeries{"_ParetoSeries", ".dat", false, true};
+inline constexpr std::array kSearchTables{kEstimateCovariance, kEstimateCorrelation, kEstimateLimits,
+                                          kEstimateJacobian,   kRepetitions,         kRepetitionRows,
+                                          kPareto,             kParetoCourse,        kParetoSeries};
 
 /// What all tasks call alike behind their own stem.
 constexpr RunFile restartFile(std::string_view stem) {

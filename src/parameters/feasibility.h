@@ -18,11 +18,18 @@ class Feasibility final {
   using Test = std::function<std::optional<std::string>(std::span<const double> set)>;
 
   Feasibility() = default;
-  explicit Feasibility(Test test, bool hasConstraints = true)
-      : test_(std::move(test)), hasConstraints_(hasConstraints) {}
+  /// By how much a set that cannot be run violates the constraints: more than 0; infinite where that is not defined.
+  using Amount = std::function<double(std::span<const double> set)>;
+  explicit Feasibility(Test test, bool hasConstraints = true, Amount amount = {})
+      : test_(std::move(test)), hasConstraints_(hasConstraints), amount_(std::move(amount)) {}
 
   bool isTested() const { return test_ != nullptr; }
   std::optional<std::string> violation(std::span<const double> set) const { return test_ ? test_(set) : std::nullopt; }
+  /// 0 if the set can be run; 1 where nobody says by how much it violates the constraints.
+  double violationAmount(std::span<const double> set) const {
+    if (holds(set)) return 0.0;
+    return amount_ ? amount_(set) : 1.0;
+  }
   /// With which a task ends that finds no set that can be run.
   std::string_view noSetMessage() const {
     return hasConstraints_ ? "Error: No parameter set found that satisfies the constraints"
@@ -33,6 +40,7 @@ class Feasibility final {
  private:
   Test test_;
   bool hasConstraints_ = true;
+  Amount amount_;
 };
 
 }  // namespace mirevo

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cassert>
 #include <cmath>
+#include <limits>
 #include <optional>
 
 #include <fmt/core.h>
@@ -53,6 +54,7 @@ class ParameterModel::Implementation {
   void assignFixedParameters();
   std::optional<ParameterFailure> assignDependentParameters();
   std::optional<ParameterFailure> checkConstraints() const;
+  double violationAmount() const;
   bool hasConstraints() const { return !constraints_.empty(); }
   bool hasEquations() const {
     return std::any_of(equations_.begin(), equations_.end(), [](const auto& equation) { return equation != nullptr; });
@@ -175,6 +177,20 @@ std::optional<ParameterFailure> ParameterModel::Implementation::checkConstraints
   return std::nullopt;
 }
 
+/// The sum over the violated constraints of the difference of their sides, as a share of both.
+double ParameterModel::Implementation::violationAmount() const {
+  constexpr double kLeast = 1.0e-9;  // sides that must not be equal
+  double sum = 0.0;
+  for (const CompiledConstraint& compiled : constraints_) {
+    const double left = valueOf(*compiled.left, compiled.constraint.leftEquation);
+    const double right = valueOf(*compiled.right, compiled.constraint.rightEquation);
+    if (!CheckConstraint(left, right, compiled.constraint.logicalOperator)) continue;
+    const double share = std::abs(left - right) / (std::abs(left) + std::abs(right));
+    sum += std::isfinite(share) ? std::max(kLeast, share) : kLeast;
+  }
+  return sum > 0.0 ? sum : std::numeric_limits<double>::infinity();
+}
+
 ParameterModel::ParameterModel(std::vector<ModelParameter> parameters, std::vector<InternalConstraint> constraints) {
   if (parameters.empty()) fatalError("Error: No model parameters defined");
   implementation_ = std::make_unique<Implementation>(std::move(parameters), std::move(constraints));
@@ -210,7 +226,14 @@ Feasibility ParameterModel::feasibility() {
         const auto* failure = std::get_if<ParameterFailure>(&mapped);
         return failure == nullptr ? std::nullopt : std::optional(failure->detail);
       },
-      hasConstraints);
+      hasConstraints,
+      [this](std::span<const double> set) {
+        const auto mapped = MapToModelValues(set);
+        const auto* failure = std::get_if<ParameterFailure>(&mapped);
+        if (failure == nullptr) return 0.0;
+        return failure->kind == ParameterFailure::Kind::constraintViolated ? implementation_->violationAmount()
+                                                                           : std::numeric_limits<double>::infinity();
+      });
 }
 
 std::vector<double> allModelValues(ParameterModel& model, std::span<const double> variable) {

@@ -194,15 +194,17 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
 }
 
 void RunReporter::compareFinalRun(const EvaluationResult& result) {
+  if (finalRunOf_ == 0 && !best()) return;
+  const int number = finalRunOf_ != 0 ? finalRunOf_ : best()->number;
   std::string reason;
-  const auto row = best() ? results_.rowOf(best()->number, reason) : std::nullopt;
+  const auto row = results_.rowOf(number, reason);
   if (!reason.empty()) {
-    warning(fmt::format("The final model run is not compared with evaluation No. {} of the same set: {}: {}",
-                        best()->number, results_.path(), reason));
+    warning(fmt::format("The final model run is not compared with evaluation No. {} of the same set: {}: {}", number,
+                        results_.path(), reason));
   }
   if (!row || row->measures == result.measureValues) return;
   const std::string start =
-      fmt::format("The final model run has other results than evaluation No. {} of the same set", best()->number);
+      fmt::format("The final model run has other results than evaluation No. {} of the same set", number);
   if (repeatCount_ > 0) {
     urgentWarning(
         fmt::format("{}, and {} have the results of earlier ones: a model that draws random numbers needs "
@@ -408,6 +410,7 @@ std::vector<JudgedEvaluation> RunReporter::judged() const {
 
 void RunReporter::takeBestOf(const SearchSummary& search) {
   searchHasEnded_ = true;
+  finalRunOf_ = search.finalRunOf;
   if (search.best.empty() || !search.bestResult.ok()) return;
   best_.takeOfSearch({search.bestResult.number, search.bestResult.aggregate, ToModelScale(space_, search.best)});
 }

@@ -17,6 +17,8 @@
 
 namespace mirevo {
 
+struct ParetoSettings;
+
 /// What is true of a search whatever its settings.
 struct SearchFacts {
   CodeName name;                    ///< in setups; the name is also used in messages and reports: "SCE"
@@ -28,9 +30,13 @@ struct SearchFacts {
   bool usesResiduals = false;       ///< it needs the residuals of every run, and continuous parameters
   /// Of a search that does not fill several slots: what a job of several processes runs at once all the same.
   std::string_view runsAtOnceUnderMpi = {};
+  bool findsFront = false;                   ///< each objective function is an objective of its own; it needs several
   std::string_view populationKeywords = {};  ///< "Population_Size"; empty if it has no population
   std::string_view whyNotRepeated = {};      ///< why repetitions of it are refused; empty if they are not
 };
+
+/// Of searches for a front.
+inline constexpr std::string_view kFrontNotRepeated = "repetitions compare best values, and a front has none";
 
 /// A keyword whose value is small for the number of variable parameters: the search may end early.
 struct SearchAdvice {
@@ -89,6 +95,9 @@ class SearchMethod {
   virtual bool testsPopulationRange() const { return false; }
   /// Whether it evaluates a sample from which the scale of the objective functions can be determined.
   virtual bool evaluatesSample(const InitialSampleSettings& sample) const = 0;
+
+  /// Of a search that finds a front, what these have in common; nullptr of the others.
+  virtual const ParetoSettings* paretoSettings() const { return nullptr; }
 
   /// Number of points of its population; 0 if it has none.
   virtual std::int64_t populationSize() const { return 0; }

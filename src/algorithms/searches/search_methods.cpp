@@ -8,7 +8,9 @@
 #include "algorithms/searches/cma_es.h"
 #include "algorithms/searches/dds.h"
 #include "algorithms/searches/glm.h"
+#include "algorithms/searches/nsga_ii.h"
 #include "algorithms/searches/opse.h"
+#include "algorithms/searches/padds.h"
 #include "algorithms/searches/pdds.h"
 #include "algorithms/searches/pse.h"
 #include "algorithms/searches/sce.h"
@@ -17,8 +19,8 @@ namespace mirevo {
 
 const ChoiceTable<SearchMethod>& searchMethods() {
   /// A new search is added here.
-  static const auto searches =
-      ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod, PddsMethod, OpseMethod, CmaEsMethod, GlmMethod>();
+  static const auto searches = ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod, PddsMethod, OpseMethod,
+                                                             CmaEsMethod, GlmMethod, NsgaIiMethod, PaddsMethod>();
   return searches;
 }
 

@@ -15,6 +15,7 @@ namespace mirevo {
 
 class ProposalSelector;
 struct ResidualProblem;
+struct ParetoProblem;
 
 /// A search with a smaller budget, from whose best parameter set a search with a raised budget continues.
 struct EarlierSearch {
@@ -34,6 +35,7 @@ struct SearchProblem {
   std::vector<EarlierSearch> earlierSearches = {};  ///< the searches that this one continues, in order
   Feasibility feasibility = {};                     ///< which sets can be run, of a model with constraints
   ResidualProblem* residuals = nullptr;             ///< of a search by residuals
+  ParetoProblem* pareto = nullptr;                  ///< of a search that finds a front
 };
 
 }  // namespace mirevo

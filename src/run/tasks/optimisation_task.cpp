@@ -19,6 +19,7 @@
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/off_grid.h"
+#include "run/tasks/simulated_room.h"
 #include "run/tasks/watched_evaluator.h"
 
 namespace mirevo {
@@ -362,7 +363,7 @@ std::vector<double> OptimisationTask::givenValues(std::size_t parameter) const {
   return parameter < givenValues_.size() ? givenValues_[parameter] : std::vector<double>{};
 }
 
-void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) const {
+void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) {
   if (method->facts().needsRanges) refuseEmptyRanges(reading);
   const BoundSection bound = method->section();
   const SetupSection control = section.open(nameInside(*bound.row));
@@ -376,7 +377,16 @@ void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection
   }
   for (const SearchDoubt& doubt : method->doubts()) control.warn(doubt.keyword, doubt.text);
   if (method->facts().usesResiduals) requireResiduals(reading, section);
+  if (const ParetoSettings* const pareto = method->paretoSettings()) {
+    requireObjectives(section, kAlgorithmKeyword, control, reading.objectives, method->facts().name.name, *pareto);
+    keepsFrontSeries_ = pareto->series != FrontSeries::none && hasSeriesOfFront(reading.measures);
+  }
   control.require(method->refusalFor(BuildSearchSpace(reading.parameters)));
+}
+
+std::optional<KeptSteps> OptimisationTask::keptSteps() const {
+  if (!keepsFrontSeries_ || method->paretoSettings()->series != FrontSeries::steps) return std::nullopt;
+  return KeptSteps{};
 }
 
 void OptimisationTask::requireResiduals(const TaskReading& reading, const SetupSection& section) const {
@@ -545,7 +555,10 @@ void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& 
   for (std::int32_t i = 0; i < samples; ++i) {
     UniformGenerator random(repetitionSeed(randomSeed, i));
     NoModel evaluator;
-    method->make(problemOf(space, feasibility, evaluator, random))->initialise();
+    SearchProblem problem = problemOf(space, feasibility, evaluator, random);
+    ParetoProblem pareto;
+    problem.pareto = &pareto;
+    method->make(std::move(problem))->initialise();
   }
 }
 
@@ -556,6 +569,7 @@ SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& ev
   std::optional<ProposalSelector> selector;
   if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds, problem.feasibility);
   if (fitting_) problem.residuals = &fitting_->problem();
+  if (front_) problem.pareto = &front_->problem();
   return method->run(std::move(problem), step);
 }
 
@@ -585,8 +599,7 @@ void OptimisationTask::logEnd(const TaskContext& context, const SearchSummary& s
                               const BestCourse& course) const {
   for (const std::string& note : summary.notes) context.log.line(note);
   context.log.line(summary.terminationMessage);
-  const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
-  for (const std::string& line : courseLines(course, isBudgetUsed)) context.log.line(line);
+  for (const std::string& line : linesOfCourse(course, summary.terminationMessage)) context.log.line(line);
   if (summary.replacedCount > 0) {
     context.log.line(fmt::format(
         "Proposed points that cannot be run (a constraint is violated, or an equation has no finite value) and were "
@@ -604,25 +617,45 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
     fitting_ = std::make_unique<ResidualFitting>(context);
     if (const auto text = fitting_->otherMeasuresText(context)) context.log.warning(*text);
   }
-  const SearchSummary summary = searchAll(context);
+  if (const ParetoSettings* const pareto = method->paretoSettings()) {
+    front_ = std::make_unique<FrontFinding>(*pareto);
+    if (keepsFrontSeries_) {
+      logRoomOfSimulatedValues(context, facts().resultFiles.simulatedValues,
+                               static_cast<std::size_t>(stopping.maxEvaluations));
+    }
+  }
+  SearchSummary summary = searchAll(context);
   TaskOutcome outcome{summary.terminationMessage};
   if (repeated_) {
     repeated_->addResults(context.space, outcome);
     for (const std::string& line : outcome.report) context.log.reportLine(line);
     context.log.line("");
   }
-  const std::vector<ParameterSet> best{summary.best};
-  if (best.front().empty()) return outcome;
+  if (summary.best.empty()) return outcome;
+  const FrontMember* const suggested = front_ ? front_->suggested() : nullptr;
+  if (suggested != nullptr) summary.finalRunOf = suggested->number;
   if (context.searchEnded) context.searchEnded(summary);
-  logBestSet(context, best.front(), summary.bestResult);
+  logBestSet(context, summary.best, summary.bestResult);
   if (fitting_) {
     fitting_->addCovariance(context, outcome);
     logReport(context, outcome.report);
   }
+  if (front_) {
+    front_->addFront(context, summary.bestResult.number, outcome);
+    logReport(context, outcome.report);
+  }
   context.log.line("");
-  context.log.line("Final model run with the best parameter set:");
-  context.evaluator.evaluateParameterSets(best, DispatchMode::finalRun);
+  context.log.line(suggested == nullptr ? "Final model run with the best parameter set:"
+                                        : fmt::format("Final model run with the suggested compromise, evaluation {}:",
+                                                      suggested->number));
+  const std::vector<ParameterSet> last{suggested == nullptr ? summary.best : suggested->set};
+  context.evaluator.evaluateParameterSets(last, DispatchMode::finalRun);
   return outcome;
+}
+
+std::vector<std::string> OptimisationTask::linesOfCourse(const BestCourse& course, std::string_view message) const {
+  const bool isBudgetUsed = message == kBudgetUsedMessage;
+  return front_ ? front_->courseLines(isBudgetUsed) : courseLines(course, isBudgetUsed);
 }
 
 std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext& context,
@@ -630,6 +663,11 @@ std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext
   if (repeated_) {
     TaskOutcome outcome{std::string(kEndOfTask)};
     repeated_->addResults(context.space, outcome);
+    return outcome;
+  }
+  if (front_ && front_->hasFront()) {
+    TaskOutcome outcome{std::string(kEndOfTask)};
+    front_->addFront(context, 0, outcome);
     return outcome;
   }
   if (!fitting_ || !fitting_->hasDerivatives()) return std::nullopt;
@@ -640,6 +678,7 @@ std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext
 
 std::optional<int> OptimisationTask::evaluationsInBatches() const {
   if (repeated_) return repeated_->evaluationCount();
+  if (front_) return front_->evaluationCount();
   if (!fitting_ || !fitting_->hasDerivatives()) return 0;
   return fitting_->problem().evaluationCount;
 }

@@ -1,9 +1,11 @@
 #pragma once
 
+#include "algorithms/searches/best_course.h"
 #include "algorithms/searches/initial_sample.h"
 #include "algorithms/searches/search_methods.h"
 #include "algorithms/searches/stopping_criteria.h"
 #include "algorithms/surrogate/proposal_selector.h"
+#include "run/tasks/pareto_front.h"
 #include "run/tasks/repeated_search.h"
 #include "run/tasks/residual_fit.h"
 #include "run/tasks/task.h"
@@ -31,10 +33,12 @@ class OptimisationTask final : public Task {
   std::optional<OneSlotOnly> needsOneSlot() const override;
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
-  /// A search by residuals needs them in every result.
-  bool keepsSimulatedValues() const override { return method && method->facts().usesResiduals; }
+  /// A search by residuals needs them in every result; one for a front shows those of the front.
+  bool keepsSimulatedValues() const override { return method && (method->facts().usesResiduals || keepsFrontSeries_); }
+  bool readsSimulatedValues() const override { return keepsFrontSeries_; }
+  std::optional<KeptSteps> keptSteps() const override;
   SeriesPrecision keptPrecision() const override {
-    return keepsSimulatedValues() ? SeriesPrecision::exact : SeriesPrecision::single;
+    return method && method->facts().usesResiduals ? SeriesPrecision::exact : SeriesPrecision::single;
   }
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
@@ -59,7 +63,7 @@ class OptimisationTask final : public Task {
   void readEarlierResults(const TaskReading& reading, const SetupSection& section);
   void keepAsGiven(const TaskReading& reading, std::span<const ParameterSet> modelScale, const SetupSection& section,
                    std::string_view keyword);
-  void readMethod(const TaskReading& reading, const SetupSection& section) const;
+  void readMethod(const TaskReading& reading, const SetupSection& section);
   void readStopping(const SetupSection& section, std::size_t variableCount);
   void warnOfOneLoop(const SetupSection& section) const;
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
@@ -71,6 +75,7 @@ class OptimisationTask final : public Task {
   SearchSummary searchAll(const TaskContext& context);
   void logEnd(const TaskContext& context, const SearchSummary& summary, const BestCourse& course) const;
   void requireResiduals(const TaskReading& reading, const SetupSection& section) const;
+  std::vector<std::string> linesOfCourse(const BestCourse& course, std::string_view message) const;
 
   std::optional<std::string> sampleText_;         ///< of a sample file, which is read once
   std::vector<std::vector<double>> givenValues_;  ///< those of a file, one entry per model parameter
@@ -78,6 +83,8 @@ class OptimisationTask final : public Task {
   std::vector<EarlierSearch> earlierSearches_;
   std::unique_ptr<ResidualFitting> fitting_;  ///< of a search by residuals, once it runs
   std::optional<RepeatedSearch> repeated_;    ///< once it runs
+  std::unique_ptr<FrontFinding> front_;       ///< of a search for a front, once it runs
+  bool keepsFrontSeries_ = false;
 };
 
 }  // namespace mirevo

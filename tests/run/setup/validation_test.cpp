@@ -209,7 +209,8 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Perturbed value for parameter Depth in local sensitivity analysis out of bounds",
        "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
       {"Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31", "Lower bound equal to upper bound for parameter Rate",
-       "expected more than 0.31 for a search by SCE, PSE, OPSE, CMA-ES or GLM; Parameter_Type = 1 fixes a parameter"},
+       "expected more than 0.31 for a search by SCE, PSE, OPSE, CMA-ES, GLM or NSGA-II; Parameter_Type = 1 fixes a "
+       "parameter"},
       {"Algorithm_Type = 1 => 'GLM' & Transformation_Type = 1 => 2",
        "Integer parameter Depth in a search by derivatives",
        "expected 0 or 1 for GLM, found an integer parameter, by which there are no derivatives; Parameter_Type = 1"},
@@ -243,7 +244,8 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Unable to open section SURROGATE_MODEL_PARAMETERS in KDX file",
        "Use_Surrogate_Model: Parallel Dynamically Dimensioned Search uses no surrogate model: expected 0"},
       {"Algorithm_Type = 1 => 3", "Invalid optimisation algorithm type selection",
-       "expected 0 to 2 or one of the names 'SCE', 'PSE', 'DDS', 'PDDS', 'OPSE', 'CMA-ES', 'GLM', found 3"},
+       "expected 0 to 2 or one of the names 'SCE', 'PSE', 'DDS', 'PDDS', 'OPSE', 'CMA-ES', 'GLM', 'NSGA-II', 'PADDS', "
+       "found 3"},
       {"'sample.txt' => ''", "Unable to open ", "expected the name of a file, found a blank text"},
       {"'sample.txt' => 'none.txt'", "Unable to open none.txt", "No such file"},
       {"Neighbourhood_Size = 60 => 5 & Sampling_rate = 30 => 0",
@@ -254,10 +256,12 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Neighbourhood_Size = 61 evaluated sets before the surrogate is fitted, found 60"},
       {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
        "expected 1 with this Algorithm_Type, found 4; several model runs at a time: Algorithm_Type = 'PSE', "
-       "'PDDS', 'OPSE', 'CMA-ES' or 'GLM', or a job of several processes (MPI), in which SCE runs one proposal of each "
+       "'PDDS', 'OPSE', 'CMA-ES', 'GLM', 'NSGA-II' or 'PADDS', or a job of several processes (MPI), in which SCE runs "
+       "one proposal of each "
        "complex at once"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS', 'OPSE', 'CMA-ES' or 'GLM', or a job of "
+       "found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS', 'OPSE', 'CMA-ES', 'GLM', 'NSGA-II' or "
+       "'PADDS', or a job of "
        "several "
        "processes "
        "(MPI)"},
@@ -356,9 +360,9 @@ using RowInSetup = std::tuple<const SectionRow*, const KeywordRow*, std::string>
 std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
   static const std::pair<std::string_view, const char*> kOptions[] = {
       {"SCENARIOS", "0"}, {"SENSITIVITY_ANALYSIS", "1"}, {"UNCERTAINTY_ESTIMATION", "3"}};
-  static const std::pair<std::string_view, const char*> kAlgorithms[] = {{"SCE_", "0"},          {"DDS_", "2"},
-                                                                         {"PDDS_", "'PDDS'"},    {"OPSE_", "'OPSE'"},
-                                                                         {"CMAES_", "'CMA-ES'"}, {"GLM_", "'GLM'"}};
+  static const std::pair<std::string_view, const char*> kAlgorithms[] = {
+      {"SCE_", "0"},          {"DDS_", "2"},     {"PDDS_", "'PDDS'"},      {"OPSE_", "'OPSE'"},
+      {"CMAES_", "'CMA-ES'"}, {"GLM_", "'GLM'"}, {"NSGAII_", "'NSGA-II'"}, {"PADDS_", "'PADDS'"}};
   // Forms of the sensitivity analysis with a section of their own, and what that needs.
   static const std::tuple<std::string_view, const char*, const char*> kForms[] = {
       {"MORRIS", "'Morris'", ""}, {"SOBOL", "'Sobol'", "Sample_Size = 64\n"}};
@@ -433,10 +437,17 @@ TEST_F(ValidationTest, RefusesNumbersOutsideTheRangeOfTheirRow) {
   EXPECT_GT(checked, 90);
 }
 
+/// Searches for a front need two objective functions.
+std::string withSecondObjective(std::string text) {
+  text = SetupFixture::withValue(text, "ObjectiveFunctions/OBJECTIVE_FUNCTIONS", "TqSEKdxListItemCount", "2");
+  const auto end = text.find("[/OBJECTIVE_FUNCTIONS]");
+  return text.insert(end, "[OBJECTIVE_2]\nName = 'Another'\nFunction_Type = 0\nWeight = 1.0\n[/OBJECTIVE_2]\n");
+}
+
 TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
   const auto firstLine = [](const std::string& text) { return text.substr(0, text.find('\n')); };
   int compared = 0;
-  for (const auto& [section, row, text] : rowsInSetups(edited(""))) {
+  for (const auto& [section, row, text] : rowsInSetups(withSecondObjective(edited("")))) {
     if (row->type != KeywordType::code) continue;
     SCOPED_TRACE(std::string(section->path) + " " + std::string(row->name()));
     for (const CodeName& code : row->facts.codes) {

@@ -1,0 +1,36 @@
+#pragma once
+
+#include <cstddef>
+#include <span>
+#include <vector>
+
+namespace mirevo {
+
+/// A point of the objective space: what is minimised, and by how much its set violates constraints.
+struct ObjectivePoint {
+  std::vector<double> values;  ///< one per objective, finite where `violation` is 0
+  double violation = 0.0;      ///< 0: none; infinite for a failed model run, of which nothing is known
+};
+
+/// Whether `a` is at most `b` in every objective and less in one.
+bool dominates(std::span<const double> a, std::span<const double> b);
+
+/// Constraint-domination after Deb, Pratap, Agarwal and Meyarivan (2002), doi:10.1109/4235.996017: the smaller
+/// violation is better, and of two points without any the one that dominates the other.
+bool isConstraintDominated(const ObjectivePoint& point, const ObjectivePoint& by);
+
+/// The fast non-dominated sort of the same paper: of each point its rank, 1 for those that no other dominates, 2 for
+/// those that only points of rank 1 dominate, and so on.
+std::vector<int> nondominationRanks(std::span<const ObjectivePoint> points);
+
+/// The crowding distance of the same paper, of points of one rank: the sum over the objectives of the distance between
+/// the two neighbours of a point in that objective, as a share of its range over the points. Infinite for those at the
+/// ends of an objective; of equal values at an end, for the first in the order of the points. An objective without a
+/// range counts nothing.
+std::vector<double> crowdingDistances(std::span<const std::vector<double>> points);
+
+/// The indices, ascending, of `count` of these points that are spread over all of them: from the whole the point with
+/// the least crowding distance is left out again and again, the later of equals.
+std::vector<std::size_t> spreadOver(std::span<const std::vector<double>> points, std::size_t count);
+
+}  // namespace mirevo

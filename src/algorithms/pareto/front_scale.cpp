@@ -1,0 +1,133 @@
+#include "algorithms/pareto/front_scale.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include <fmt/format.h>
+
+#include "algorithms/pareto/dominance.h"
+#include "algorithms/pareto/hypervolume.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kFewestEvaluations = 20;  ///< below that halves and tenths say nothing
+constexpr double kNoted = 1.0e-3;       ///< share of the hypervolume below which a rise is called small
+
+double widthOf(double ideal, double nadir) {
+  return nadir > ideal ? nadir - ideal : 1.0;
+}
+
+}  // namespace
+
+FrontScale::FrontScale(std::span<const std::vector<double>> front, std::span<const double> reference)
+    : ideal_(front.front()), nadir_(front.front()) {
+  for (const std::vector<double>& values : front) {
+    for (std::size_t i = 0; i < values.size(); ++i) {
+      ideal_[i] = std::min(ideal_[i], values[i]);
+      nadir_[i] = std::max(nadir_[i], values[i]);
+    }
+  }
+  if (reference.size() == ideal_.size()) {
+    reference_ = scaled(reference);
+  } else {
+    reference_.assign(ideal_.size(), kUsualReference);
+  }
+}
+
+std::vector<double> FrontScale::scaled(std::span<const double> values) const {
+  std::vector<double> result(values.size());
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    result[i] = (values[i] - ideal_[i]) / widthOf(ideal_[i], nadir_[i]);
+  }
+  return result;
+}
+
+double FrontScale::distance(std::span<const double> values) const {
+  double sum = 0.0;
+  for (const double value : scaled(values)) sum += value * value;
+  return std::sqrt(sum);
+}
+
+bool FrontScale::isReferenceUsable() const {
+  return std::ranges::all_of(reference_, [](double value) { return value > 0.0; });
+}
+
+double FrontScale::hypervolumeShare(std::span<const std::vector<double>> front) const {
+  if (!isReferenceUsable()) return 0.0;
+  double box = 1.0;
+  for (const double value : reference_) box *= value;
+  std::vector<std::vector<double>> points;
+  for (const std::size_t i : spreadOver(front, mostPointsOfHypervolume(ideal_.size()))) {
+    points.push_back(scaled(front[i]));
+  }
+  return hypervolume(points, reference_) / box;
+}
+
+std::optional<std::size_t> nearestToIdeal(std::span<const FrontMember> members) {
+  if (members.empty()) return std::nullopt;
+  std::vector<std::vector<double>> front;
+  for (const FrontMember& member : members) front.push_back(member.values);
+  const FrontScale scale(front);
+  const auto nearest = std::ranges::min_element(
+      front, {}, [&scale](const std::vector<double>& values) { return scale.distance(values); });
+  return static_cast<std::size_t>(nearest - front.begin());
+}
+
+std::vector<FrontStage> frontCourse(const ParetoArchive& archive, std::span<const double> reference, int most) {
+  std::vector<FrontStage> course;
+  if (archive.members().empty()) return course;
+  const FrontScale scale(archive.front(), reference);
+  FrontHistory history(archive.entries());
+  const int last = archive.evaluationCount();
+  const int count = std::min(most, last);
+  for (int i = 1; i <= count; ++i) {
+    const auto evaluations = static_cast<int>(std::int64_t{last} * i / count);
+    const std::vector<std::vector<double>>& front = history.frontAfter(evaluations);
+    course.push_back({evaluations, front.size(), scale.hypervolumeShare(front)});
+  }
+  return course;
+}
+
+std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::span<const double> reference,
+                                          bool isBudgetUsed) {
+  const int count = archive.evaluationCount();
+  if (archive.members().empty() || count < kFewestEvaluations) return {};
+  const FrontScale scale(archive.front(), reference);
+  if (!scale.isReferenceUsable()) return {};
+  FrontHistory history(archive.entries());
+  const double quarter = scale.hypervolumeShare(history.frontAfter(count / 4));
+  const double half = scale.hypervolumeShare(history.frontAfter(count / 2));
+  const double tenth = scale.hypervolumeShare(history.frontAfter(static_cast<int>(std::int64_t{count} * 9 / 10)));
+  const double end = scale.hypervolumeShare(archive.front());
+  const auto riseText = [](double from, double to) {
+    if (to <= from) return std::string("did not grow");
+    return fmt::format("grew from {:.6g} to {:.6g} ({:.2g} %)", from, to, 100.0 * (to - from) / to);
+  };
+  std::vector<std::string> lines;
+  lines.push_back(fmt::format(
+      "Course: in the second half of the evaluations the hypervolume {}, in the last tenth it {}; the last set to join "
+      "the front was evaluation {} of {}",
+      riseText(half, end), riseText(tenth, end), archive.entries().back().evaluation, count));
+  if (!isBudgetUsed) {
+    lines.emplace_back(
+        "A larger budget would not have changed this: the search had ended by itself. Other values of Random_Seed can "
+        "tell whether there is a better front");
+    return lines;
+  }
+  const double later = end - half;
+  const double earlier = half - quarter;
+  const double rise = earlier > later ? later * later / earlier : later;
+  if (rise <= kNoted * end) {
+    lines.emplace_back(
+        "The hypervolume has come to rest. Other values of Random_Seed can tell whether there is a better front");
+  } else {
+    lines.push_back(
+        fmt::format("If it went on growing as it did, {} more evaluations would add about {:.2g} % to it. Such a trend "
+                    "is rough",
+                    count, 100.0 * rise / end));
+  }
+  return lines;
+}
+
+}  // namespace mirevo
