@@ -28,6 +28,7 @@ struct SearchFacts {
   bool usesResiduals = false;       ///< it needs the residuals of every run, and continuous parameters
   /// Of a search that does not fill several slots: what a job of several processes runs at once all the same.
   std::string_view runsAtOnceUnderMpi = {};
+  std::string_view modelChooses = "one";     ///< how many of the proposals for one run a surrogate model chooses
   std::string_view populationKeywords = {};  ///< "Population_Size"; empty if it has no population
 };
 

@@ -450,10 +450,10 @@ std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space
                                 countText(earlierSets_.successCount, "successful evaluation")));
   }
   if (!usesSurrogate()) return lines;
-  lines.push_back(fmt::format(
-      "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}",
-      surrogateModelName(surrogate), neighbourhoodSize(surrogate, space.size()), proposalsPerRun(surrogate),
-      surrogate.initialGenerations));
+  lines.push_back(
+      fmt::format("Surrogate model: {} fitted to the {} nearest sets, chooses {} of {} proposals; loops without it: {}",
+                  surrogateModelName(surrogate), neighbourhoodSize(surrogate, space.size()),
+                  method->facts().modelChooses, proposalsPerRun(surrogate), surrogate.initialGenerations));
   return lines;
 }
 
