@@ -78,6 +78,7 @@ bool CmaEs::runWithModel(std::vector<Point>& points) {
   firstRuns_ = std::max(firstRuns_, batch);
   const auto rankingNow = [&] {
     std::vector<std::optional<double>> values;
+    values.reserve(lambda);
     for (const Point& point : points) values.push_back(point.value);
     return rankingOf(values, distribution_->constants().parents);
   };

@@ -127,7 +127,7 @@ std::optional<std::vector<double>> CmaSurrogate::minimum(std::span<const double>
     box.upper[j] = std::max(box.upper[j], from[j]);
   }
   const std::vector<double> lowest = patternSearch(value, from, box, std::vector<double>(n_, 0.0));
-  const std::optional<std::vector<double>> place = placeOf(placeAt(lowest));
+  std::optional<std::vector<double>> place = placeOf(placeAt(lowest));
   if (!place) return std::nullopt;
   const std::vector<double> at = coordinatesOf(*place);
   const auto isSamePlace = [&](const std::vector<double>& point) {
