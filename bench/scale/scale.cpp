@@ -2,11 +2,12 @@
 //
 //   scale FIGURE [FOLDER [COUNT]]   FIGURE is one of the names that it prints without arguments; FOLDER is where a
 //                                   folder for it is made (default: the temporary one). COUNT: of `bands` and `glue`
-//                                   the model runs, of `report` the measures of each series, of `sensitivity` the
-//                                   parameters
+//                                   the model runs, of `report` the measures of each series, of `sensitivity` and
+//                                   `glm` the parameters
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
 #include <string>
 #include <string_view>
 #include <unistd.h>
@@ -148,6 +149,38 @@ void sensitivity(const std::string& folder, int count) {
   measureProgram(fmt::format("sensitivity analysis with covariance of {} parameters, 5,000 values", parameters), setup);
 }
 
+/// A search by GLM of 200 parameters, or `count`, by 10,000 observations: every value depends on two of the parameters,
+/// on one of them by its square.
+void glm(const std::string& folder, int count) {
+  constexpr int kObservations = 10'000;
+  const int parameters = count > 0 ? count : 200;
+  const std::string measure =
+      itemCount(1) +
+      section("MEASURE_1", {"Name = 'm'\nStatistic_Type = 1\nFunction_Name = 'all'\n",
+                            section("SIMULATION_FILE", {"File_Name = 'base/simulated.csv'\nItem_No = 1\n"}),
+                            section("OBSERVATION_FILE", {"File_Name = 'observed.csv'\nItem_No = 1\n"})});
+  const std::string setup = writeSetup(
+      folder,
+      {.parameters = parameters,
+       .simulation = "Report = 0\n",
+       .measures = measure,
+       .task = section("OPTIMISATION_ALGORITHM", {"Algorithm_Type = 'GLM'\n", section("GLM_CONTROL_PARAMETERS", {}),
+                                                  section("INITIAL_SAMPLE", {"Include_Initial_Parameters = 1\n"}),
+                                                  section("STOPPING_CRITERIA", {"Max_No_Evaluations = 3000\n"})}),
+       .model = "awk -F, 'NR == FNR { p[FNR] = $1; n = FNR; next } FNR == 1 { print; next } "
+                "{ q = p[FNR * FNR % n + 1]; printf \"%s,%.9g\\n\", $1, p[FNR % n + 1] * (1 + FNR % 7) + q * q }' "
+                "parameters.txt input.csv > simulated.csv\n"});
+  for (const std::string file : {"/base/input.csv", "/base/simulated.csv", "/observed.csv"}) {
+    writeHourlySeries(folder + file, 1, kObservations);
+  }
+  measureProgram(fmt::format("GLM of {} parameters and {} observations", parameters, kObservations), setup);
+  std::ifstream log(folder + "/scale.log");
+  for (std::string line; std::getline(log, line);) {
+    if (line.find("of GLM") != std::string::npos || line.find(" model evaluations, ") != std::string::npos)
+      fmt::print("   {}\n", line);
+  }
+}
+
 void surrogate(const std::string& /*folder*/, int /*count*/) {
   measureQuadraticSurrogate();
 }
@@ -168,6 +201,7 @@ constexpr Figure kFigures[] = {{"restart", restart},
                                {"bands", bands},
                                {"glue", glue},
                                {"sensitivity", sensitivity},
+                               {"glm", glm},
                                {"surrogate", surrogate},
                                {"covariance", covariance}};
 

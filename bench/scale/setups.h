@@ -33,8 +33,8 @@ std::string ddsSections(int budget);
 /// An uncertainty analysis of so many sets.
 std::string uncertaintySections(int sets, int parameters, std::string_view further = {});
 
-/// Runs the built program with the setup and prints its time, processor time and peak memory, and the sizes of its
-/// largest files. Throws FatalError if it fails.
+/// Runs the built program with the setup and prints its time, its processor time with and without that of the model
+/// runs, its peak memory, and the sizes of its largest files. Throws FatalError if it fails.
 void measureProgram(std::string_view what, const std::string& setup);
 
 }  // namespace mirevo::bench

@@ -1,17 +1,19 @@
 /// Prints what the searches need on the catchments of the examples: the tables of docs/algorithms/which-search.md. The
 /// models run inside this program, with parameters, bounds, scales and years of the setups. Usage: catchment_search
-/// STAGED_EXAMPLES [piscataquis | sitter [GLM]], the folder being examples/ in a build folder, where the targets
-/// example_piscataquis and example_sitter put data.
+/// STAGED_EXAMPLES [piscataquis | sitter [seeds [search]]], the folder being examples/ in a build folder, where the
+/// targets example_piscataquis and example_sitter put data; 100 seeds and all searches, "GLM" and "SCE" among them,
+/// unless it says otherwise.
 
 #include <cmath>
 #include <cstdio>
+#include <cstdlib>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include <fmt/format.h>
 
-#include "algorithms/searches/glm.h"
+#include "glm_trials.h"
 #include "models/gr4j_cemaneige.h"
 #include "models/model_files.h"
 #include "models/muskingum.h"
@@ -72,13 +74,9 @@ std::vector<double> discharge(const models::Parameters& parameters, const Days& 
   return flows;
 }
 
-/// What GLM needs of a catchment: the residuals of a set, the sum of whose squares is the sum of the squared terms of
-/// the aggregate.
-using Residuals = std::function<std::vector<double>(const std::vector<double>&)>;
-
 struct Catchment {
   TestFunction function;
-  Residuals residuals;
+  Residuals residuals;  ///< the sum of their squares is that of the squared terms of the aggregate
 };
 
 /// Appends the differences in the years from `first` to `last`, divided by `divisor` and the root of their number.
@@ -164,101 +162,81 @@ Catchment sitter(const std::string& folder, double target) {
       }};
 }
 
-/// The target evaluator with the residuals where a model run has its simulated values.
-class ResidualEvaluator final : public Evaluator {
- public:
-  ResidualEvaluator(TargetEvaluator& target, const Residuals& residuals) : target_(target), residuals_(residuals) {}
-
-  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override {
-    std::vector<EvaluationResult> results = target_.evaluateParameterSets(sets, mode);
-    for (std::size_t i = 0; i < sets.size(); ++i) results[i].simulatedValues = residuals_(sets[i]);
-    return results;
-  }
-
- private:
-  TargetEvaluator& target_;
-  const Residuals& residuals_;
-};
-
-Outcome glmTrial(const Catchment& catchment, const GlmSettings& settings, int budget, int seed, bool stopsAtTarget) {
-  const TestFunction& function = catchment.function;
-  ResidualProblem residuals;
-  SearchBounds bounds{function.lower, function.upper, {}};
-  for (std::size_t j = 0; j < function.size(); ++j) {
-    bounds.initial.push_back(0.5 * (function.lower[j] + function.upper[j]));
-    residuals.space.names.push_back(fmt::format("x{}", j + 1));
-    residuals.space.transformation.push_back(TransformationType::none);
-  }
-  residuals.space.lower = function.lower;
-  residuals.space.upper = function.upper;
-  residuals.space.initial = bounds.initial;
-  residuals.residualsOf = [](const EvaluationResult& result) {
-    return ResidualRows{result.simulatedValues, std::vector<double>(result.simulatedValues.size(), 0.0)};
-  };
-  TargetEvaluator target(function, {.budget = budget}, seed);
-  ResidualEvaluator evaluator(target, catchment.residuals);
-  UniformGenerator random(seed);
-  InitialSampleSettings sample;
-  sample.includeInitialParameters = false;
-  SearchProblem problem{bounds, {budget, 10, 0.001}, sample, {}, evaluator, random};
-  problem.residuals = &residuals;
-  Glm search(settings, std::move(problem));
-  search.initialise();
-  while (!search.isTerminated() && !(stopsAtTarget && target.hasHitTarget())) search.advance();
-  return {target.hasHitTarget(), stopsAtTarget ? target.evaluationsToTarget : target.evaluations, target.bestInTime};
+void printRow(std::string_view name, const std::vector<Outcome>& outcomes,
+              const std::vector<std::vector<double>>& best) {
+  fmt::print("| {} | {} |", name, successText(outcomes));
+  for (const std::vector<double>& values : best) fmt::print(" {:.4f} |", medianOf(values));
+  fmt::print("\n");
+  std::fflush(stdout);
 }
 
-void printGlm(const Catchment& catchment, const std::vector<int>& budgets, int successBudget, int seeds) {
+/// The best values after each of the checkpoints.
+std::vector<std::vector<double>> bestValues(const std::vector<Outcome>& outcomes, std::size_t checkpoints) {
+  std::vector<std::vector<double>> best(checkpoints);
+  for (const Outcome& outcome : outcomes) {
+    for (std::size_t i = 0; i < checkpoints; ++i) best[i].push_back(outcome.bestAfter[i]);
+  }
+  return best;
+}
+
+void printGlm(const Catchment& catchment, const std::vector<int>& budgets, int seeds) {
   const std::vector<std::pair<std::string_view, GlmSettings>> searches = {
       {"GLM, 20 sets, 10 starts", {.sampleSize = 20, .startCount = 10}},
       {"GLM, no Broyden updates", {.broydenUpdates = 0, .sampleSize = 20, .startCount = 10}},
       {"GLM, no Broyden updates, steps of 0.001",
        {.perturbationFraction = 0.001, .broydenUpdates = 0, .sampleSize = 20, .startCount = 10}}};
+  const Setting setting{.budget = budgets.back(), .checkpoints = budgets};
   for (const auto& [name, settings] : searches) {
     std::vector<Outcome> outcomes;
     for (int seed = 1; seed <= seeds; ++seed) {
-      outcomes.push_back(glmTrial(catchment, settings, successBudget, seed, true));
+      outcomes.push_back(runGlmTrial(catchment.function, catchment.residuals, settings, setting, seed));
     }
-    fmt::print("| {} | {} |", name, successText(outcomes));
-    for (const int budget : budgets) {
-      std::vector<Outcome> found;
-      for (int seed = 1; seed <= seeds; ++seed) found.push_back(glmTrial(catchment, settings, budget, seed, false));
-      fmt::print(" {:.4f} |", medianOf(found));
-    }
-    fmt::print("\n");
-    std::fflush(stdout);
+    printRow(name, outcomes, bestValues(outcomes, budgets.size()));
   }
 }
 
-void print(const Catchment& catchment, std::string_view search, const std::vector<int>& budgets, int successBudget,
-           int seeds) {
+/// The steps of DDS and PDDS depend on the budget: each has searches of its own.
+void printByBudget(const TestFunction& function, std::string_view name, Setting setting,
+                   const std::vector<int>& budgets, int seeds) {
+  std::vector<std::vector<double>> best;
+  std::vector<Outcome> outcomes;
+  for (const int budget : budgets) {
+    setting.budget = budget;
+    outcomes = runTrials(function, setting, false, seeds);
+    std::vector<double>& values = best.emplace_back();
+    for (const Outcome& outcome : outcomes) values.push_back(outcome.best);
+  }
+  printRow(name, outcomes, best);
+}
+
+void print(const Catchment& catchment, std::string_view search, const std::vector<int>& budgets, int seeds) {
   const TestFunction& function = catchment.function;
+  const int twice = 2 * static_cast<int>(cmaPopulationSize(function.size()));
   const std::vector<std::pair<std::string_view, Setting>> searches = {
       {"CMA-ES", {.method = Method::cma}},
-      {"CMA-ES, twice the population",
-       {.method = Method::cma, .cma = {.populationSize = 2 * static_cast<int>(cmaPopulationSize(function.size()))}}},
+      {"CMA-ES, twice the population", {.method = Method::cma, .cma = {.populationSize = twice}}},
+      {"CMA-ES, Gaussian process", {.method = Method::cma, .samplingRate = 25, .modelType = kGaussian}},
       {"SCE", {.method = Method::sce, .complexes = 4}},
+      {"SCE, Gaussian process", {.method = Method::sce, .complexes = 4, .samplingRate = 25, .modelType = kGaussian}},
       {"PSE", {.method = Method::pse, .complexes = 4}},
       {"DDS", {.method = Method::dds}},
       {"PDDS", {.method = Method::dds, .dds = {.candidates = 16, .waitsForAll = false}}}};
-  fmt::print("\n| search | successes of {} / mean evaluations with {} |", seeds, successBudget);
+  fmt::print("\n| search | successes of {} / mean evaluations with {} |", seeds, budgets.back());
   for (const int budget : budgets) fmt::print(" median after {} |", budget);
   fmt::print("\n|---|---|");
   for (std::size_t i = 0; i < budgets.size(); ++i) fmt::print("---|");
   fmt::print("\n");
-  if (search.empty() || search == "GLM") printGlm(catchment, budgets, successBudget, seeds);
+  if (search.empty() || search == "GLM") printGlm(catchment, budgets, seeds);
   for (auto [name, setting] : searches) {
-    if (search == "GLM") break;
-    setting.budget = successBudget;
-    setting.stopsAtTarget = true;
-    fmt::print("| {} | {} |", name, successText(runTrials(function, setting, false, seeds)));
-    setting.stopsAtTarget = false;
-    for (const int budget : budgets) {
-      setting.budget = budget;
-      fmt::print(" {:.4f} |", medianOf(runTrials(function, setting, false, seeds)));
+    if (!search.empty() && search != name) continue;
+    setting.budget = budgets.back();
+    if (setting.method == Method::dds) {
+      printByBudget(function, name, setting, budgets, seeds);
+      continue;
     }
-    fmt::print("\n");
-    std::fflush(stdout);
+    setting.checkpoints = budgets;
+    const std::vector<Outcome> outcomes = runTrials(function, setting, false, seeds);
+    printRow(name, outcomes, bestValues(outcomes, budgets.size()));
   }
 }
 
@@ -269,15 +247,16 @@ int main(int argc, char** argv) {
   if (argc < 2) return 1;
   const std::string folder = argv[1];
   const std::string which = argc > 2 ? argv[2] : "";
-  const std::string search = argc > 3 ? argv[3] : "";
+  const int seeds = argc > 3 ? std::atoi(argv[3]) : 100;
+  const std::string search = argc > 4 ? argv[4] : "";
   if (which.empty() || which == "piscataquis") {
     fmt::print("\nPiscataquis, 6 parameters, target 11.75 m3/s\n");
-    mirevo::print(mirevo::piscataquis(folder + "/piscataquis"), search, {300, 500, 900}, 900, 20);
+    mirevo::print(mirevo::piscataquis(folder + "/piscataquis"), search, {300, 500, 900}, seeds);
   }
   if (which.empty() || which == "sitter") {
     constexpr double kTarget = 3.72;
     fmt::print("\nSitter, 11 parameters, target {}\n", kTarget);
-    mirevo::print(mirevo::sitter(folder + "/sitter", kTarget), search, {}, 2000, 10);
+    mirevo::print(mirevo::sitter(folder + "/sitter", kTarget), search, {300, 500, 1000, 2000}, seeds);
   }
   return 0;
 }

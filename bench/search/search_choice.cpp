@@ -1,8 +1,9 @@
 /// Prints the tables of docs/algorithms/which-search.md. Usage: search_choice [table], where the table is "hard"
-/// (functions of the BBOB suite), "budgets", "noise" or "slots", or "surrogate", which the page does not have; without
-/// an argument all of them.
+/// (functions of the BBOB suite; a budget may follow), "budgets", "noise" or "slots", or of other pages "surrogate"
+/// (a search, a number of seeds and a function may follow) and "interval"; without an argument all of them.
 
 #include <cstdio>
+#include <cstdlib>
 #include <functional>
 #include <string>
 #include <string_view>
@@ -20,8 +21,7 @@ namespace {
 using namespace bench;
 
 constexpr int kTrials = 100;
-constexpr int kSurrogateTrials = 20;
-constexpr std::size_t kSurrogateParameters = 10;
+constexpr int kSurrogateTrials = 10;
 constexpr int kCandidates = 16;
 
 struct Case {
@@ -86,15 +86,45 @@ void printRow(const std::string& name, const Case& function, const std::vector<S
   std::fflush(stdout);
 }
 
-void printHard() {
-  constexpr int kBudget = 5000;
-  fmt::print("\nMedian best value over {} trials, {} evaluations (successes / their mean evaluations)\n\n", kTrials,
-             kBudget);
-  printHead("function", searches(kBudget));
-  for (const std::size_t n : {10, 20}) {
-    for (const Case& function : hardFunctionsOf(n)) {
-      printRow(fmt::format("{} {}-D", function.name, n), function, searches(kBudget), kTrials);
+void printHard(int only) {
+  for (const int budget : {300, 500, 1000, 5000}) {
+    if (only > 0 && budget != only) continue;
+    fmt::print("\nMedian best value over {} trials, {} evaluations (successes / their mean evaluations)\n\n", kTrials,
+               budget);
+    printHead("function", searches(budget));
+    for (const std::size_t n : {10, 20}) {
+      for (const Case& function : hardFunctionsOf(n)) {
+        printRow(fmt::format("{} {}-D", function.name, n), function, searches(budget), kTrials);
+      }
     }
+  }
+}
+
+/// How far the median of Rosenbrock 30-D, with its optimum where the comparison has it, is certain: the interval that
+/// holds 95 per cent of the medians of samples drawn from the trials (Efron 1979, doi:10.1214/aos/1176344552).
+void printInterval() {
+  constexpr int kSamples = 10000;
+  const TestFunction function = functionNamed("Rosenbrock 30-D");
+  fmt::print("\n{}, {} trials, 5000 evaluations of CMA-ES: median (interval of 95 per cent)\n\n", function.name,
+             kTrials);
+  for (const double step : {0.1, 0.2, 0.3}) {
+    const Setting setting{.method = Method::cma, .budget = 5000, .cma = {.initialStep = step}};
+    std::vector<double> values;
+    for (const Outcome& outcome : runTrials(function, setting, false, kTrials)) values.push_back(outcome.best);
+    UniformGenerator random(1);
+    std::vector<double> medians;
+    for (int sample = 0; sample < kSamples; ++sample) {
+      std::vector<double> drawn;
+      for (std::size_t i = 0; i < values.size(); ++i) {
+        drawn.push_back(values[static_cast<std::size_t>(random.next() * static_cast<double>(values.size()))]);
+      }
+      medians.push_back(medianOf(std::move(drawn)));
+    }
+    std::ranges::sort(medians);
+    const auto quantile = [&](double share) { return medians[static_cast<std::size_t>(share * kSamples)]; };
+    fmt::print("Initial_Step = {}: {:.2f} ({:.2f} to {:.2f})\n", step, medianOf(values), quantile(0.025),
+               quantile(0.975));
+    std::fflush(stdout);
   }
 }
 
@@ -111,21 +141,38 @@ void printBudgets() {
   }
 }
 
-/// With the Gaussian process at its default rate, beside CMA-ES and DDS without it.
-void printSurrogate() {
-  for (const int budget : {300, 500, 1000}) {
-    std::vector<Search> columns = searches(budget);
-    columns.pop_back();
-    for (Search& search : columns) {
-      if (search.name != "SCE" && search.name != "PSE") continue;
-      search.setting.samplingRate = 25;
-      search.setting.modelType = kGaussian;
-    }
-    fmt::print("\nMedian best value over {} trials, {} evaluations, SCE and PSE with the Gaussian process\n\n",
-               kSurrogateTrials, budget);
-    printHead("function", columns);
-    for (const Case& function : functionsOf(kSurrogateParameters)) {
-      printRow(fmt::format("{} {}-D", function.name, kSurrogateParameters), function, columns, kSurrogateTrials);
+/// With the Gaussian process at its default rate: CMA-ES alone and with it, SCE with it. Medians after 300, 500 and
+/// 1000 evaluations of the same runs.
+void printSurrogate(std::string_view only, int trials, std::string_view onlyFunction) {
+  const std::vector<int> checkpoints = {300, 500, 1000};
+  const Setting withModel{
+      .complexes = 2, .budget = 1000, .samplingRate = 25, .modelType = kGaussian, .checkpoints = checkpoints};
+  Setting cma{.method = Method::cma, .budget = 1000, .checkpoints = checkpoints};
+  Setting cmaWithModel = withModel;
+  cmaWithModel.method = Method::cma;
+  const std::vector<Search> columns = {
+      {"CMA-ES", cma}, {"CMA-ES with model", cmaWithModel}, {"SCE with model", withModel}};
+  fmt::print("\nMedian best value over {} trials after 300 / 500 / 1000 evaluations\n\n", trials);
+  printHead("function", columns);
+  for (const std::size_t n : {5, 10}) {
+    for (const Case& function : functionsOf(n)) {
+      const std::string name = fmt::format("{} {}-D", function.name, n);
+      if (!onlyFunction.empty() && name != onlyFunction) continue;
+      fmt::print("| {} |", name);
+      for (const Search& search : columns) {
+        if (!only.empty() && search.name != only) continue;
+        const std::vector<Outcome> outcomes = runTrials(function.make, search.setting, trials);
+        std::vector<std::string> medians;
+        for (std::size_t i = 0; i < checkpoints.size(); ++i) {
+          std::vector<double> values;
+          for (const Outcome& outcome : outcomes) values.push_back(outcome.bestAfter[i]);
+          medians.push_back(fmt::format("{:.2g}", medianOf(std::move(values))));
+        }
+        fmt::print(" {} |", fmt::join(medians, " / "));
+        std::fflush(stdout);
+      }
+      fmt::print("\n");
+      std::fflush(stdout);
     }
   }
 }
@@ -175,9 +222,12 @@ void printSlots() {
 
 int main(int argc, char** argv) {
   const std::string table = argc > 1 ? argv[1] : "";
-  if (table.empty() || table == "hard") mirevo::printHard();
+  if (table.empty() || table == "hard") mirevo::printHard(argc > 2 ? std::atoi(argv[2]) : 0);
   if (table.empty() || table == "budgets") mirevo::printBudgets();
-  if (table.empty() || table == "surrogate") mirevo::printSurrogate();
+  if (table.empty() || table == "interval") mirevo::printInterval();
+  if (table.empty() || table == "surrogate")
+    mirevo::printSurrogate(argc > 2 ? argv[2] : "", argc > 3 ? std::atoi(argv[3]) : mirevo::kSurrogateTrials,
+                           argc > 4 ? argv[4] : "");
   if (table.empty() || table == "noise") mirevo::printNoise();
   if (table.empty() || table == "slots") mirevo::printSlots();
   return 0;

@@ -58,7 +58,9 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   }
   // With noise what counts is what the chosen set is really worth.
   const double best = setting.noise > 0.0 ? function.value(search->summary().best) : evaluator.bestInTime;
-  return {evaluator.hasHitTarget(), evaluator.evaluationsToTarget, best, evaluator.evaluations};
+  evaluator.bestAfter.resize(setting.checkpoints.size(), best);  // a search may end before
+  return {evaluator.hasHitTarget(), evaluator.evaluationsToTarget, best, evaluator.evaluations,
+          std::move(evaluator.bestAfter)};
 }
 
 std::vector<Outcome> runTrials(const std::function<TestFunction(int)>& functionOf, const Setting& setting, int trials) {
@@ -82,11 +84,15 @@ std::string successText(const std::vector<Outcome>& outcomes) {
   return successes == 0 ? "0/–" : fmt::format("{}/{:.0f}", successes, sum / successes);
 }
 
+double medianOf(std::vector<double> values) {
+  std::sort(values.begin(), values.end());
+  return 0.5 * (values[(values.size() - 1) / 2] + values[values.size() / 2]);
+}
+
 double medianOf(const std::vector<Outcome>& outcomes) {
   std::vector<double> values;
   for (const Outcome& outcome : outcomes) values.push_back(outcome.best);
-  std::sort(values.begin(), values.end());
-  return 0.5 * (values[(values.size() - 1) / 2] + values[values.size() / 2]);
+  return medianOf(std::move(values));
 }
 
 std::string meanAndMedianText(const std::vector<Outcome>& outcomes) {

@@ -41,16 +41,19 @@ struct Setting {
   bool goesOnWhenConverged = false;  ///< until the budget is used up, whatever the stopping tests say
   DdsSettings dds = {};
   CmaEsSettings cma = {};
-  double noise = 0.0;    ///< standard deviation of a random factor of every value around 1
-  int slots = 1;         ///< model runs at a time, all of the same length
-  int rounds = 1 << 30;  ///< model runs one after the other for which there is time
+  double noise = 0.0;                 ///< standard deviation of a random factor of every value around 1
+  int slots = 1;                      ///< model runs at a time, all of the same length
+  int rounds = 1 << 30;               ///< model runs one after the other for which there is time
+  std::vector<int> checkpoints = {};  ///< evaluations after which the best value is noted
 };
 
 struct Outcome {
   bool isSuccess = false;
+  bool isSuccess = false;
   int evaluations = 0;  ///< until the first value within the tolerance of the optimum
   double best = 0.0;    ///< without noise, and found within the time
   int evaluationsMade = 0;
+  std::vector<double> bestAfter = {};  ///< for each of the checkpoints
 };
 
 /// Evaluates a function; counts the evaluations and records when a value is first within the tolerance of the optimum.
@@ -72,6 +75,9 @@ class TargetEvaluator final : public Evaluator {
         results[i].aggregate *= 1.0 + setting_.noise * normalQuantile(noise_.next(), fault);
       }
       if (rounds_ <= setting_.rounds) bestInTime = std::min(bestInTime, value);
+      if (std::ranges::find(setting_.checkpoints, evaluations) != setting_.checkpoints.end()) {
+        bestAfter.push_back(bestInTime);
+      }
       if (evaluationsToTarget == 0 && value - function_.optimalValue <= tolerance_) evaluationsToTarget = evaluations;
     }
     return results;
@@ -82,6 +88,7 @@ class TargetEvaluator final : public Evaluator {
   int evaluations = 0;
   int evaluationsToTarget = 0;  ///< 0 until the target is reached
   double bestInTime = std::numeric_limits<double>::infinity();
+  std::vector<double> bestAfter;  ///< for each of the checkpoints that were reached
 
  private:
   TestFunction function_;
@@ -99,6 +106,7 @@ std::vector<Outcome> runTrials(const TestFunction& function, const Setting& sett
 
 /// "successes/mean evaluations of the successful trials".
 std::string successText(const std::vector<Outcome>& outcomes);
+double medianOf(std::vector<double> values);
 double medianOf(const std::vector<Outcome>& outcomes);
 std::string meanAndMedianText(const std::vector<Outcome>& outcomes);
 

@@ -65,7 +65,7 @@ void LocalEvaluator::startNext(int slot) {
     stopIfCancelled();
     if (!isUsable(slot)) return ledger_.putBack(*place);
     runner_.setStandard(ledger_.standard());
-    auto failure = runner_.prepareModelRun(ledger_.set(*place), slot, ledger_.numberOf(*place));
+    auto failure = runner_.prepareModelRun(ledger_.set(*place), slot, ledger_.numberOf(*place), ledger_.isFinalRun());
     if (!failure) {
       ledger_.markInitiated(*place, runTimeClock());
       Running running;

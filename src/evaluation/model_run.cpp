@@ -279,7 +279,8 @@ std::optional<FolderDamage> ModelRunner::removeResults(const SlotFiles& files) {
   return std::nullopt;
 }
 
-std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot, int number) {
+std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot, int number,
+                                                              bool isFinal) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
@@ -298,7 +299,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
   }
   files.started = runTimeClock() - readingSeconds_;
   files.ended.reset();
-  shownRuns_.begin(slot, number, ToModelScale(parameters_.searchSpace(), set));
+  shownRuns_.begin(slot, number, ToModelScale(parameters_.searchSpace(), set), isFinal);
   launcher_.createProcesses(slot);
   return std::nullopt;
 }

@@ -53,9 +53,10 @@ class ModelRunner final {
                                              const std::function<void()>& look = {});
 
   /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
-  /// starts the batch; or returns why the set is not run. `number`: of the evaluation. Throws FatalError when a file
-  /// cannot be removed or written.
-  std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot, int number);
+  /// starts the batch; or returns why the set is not run. `number`: of the evaluation; `isFinal`: of the best set of a
+  /// search, which is run once more. Throws FatalError when a file cannot be removed or written.
+  std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot, int number,
+                                                   bool isFinal = false);
 
   /// The result of the slot's batch, which must have ended; its number is 0. Faults of the model run give a failed
   /// result: files that cannot be read in what is left of the time of a model run among them. `look` is called about

@@ -4,12 +4,12 @@
 
 namespace mirevo {
 
-void ShownRuns::begin(int slot, int number, std::vector<double> parameterValues) {
-  runs_[slot] = {number, std::move(parameterValues)};
+void ShownRuns::begin(int slot, int number, std::vector<double> parameterValues, bool isFinal) {
+  runs_[slot] = {number, std::move(parameterValues), isFinal};
 }
 
 bool ShownRuns::isShownAnyhow(const Run& run, double aggregate) const {
-  return std::isnan(aggregate) || aggregate <= best_ || run.number <= firstRuns_;
+  return run.isFinal || std::isnan(aggregate) || aggregate <= best_ || run.number <= firstRuns_;
 }
 
 bool ShownRuns::wouldBeShown(int slot, double aggregate) const {

@@ -18,8 +18,10 @@ class ShownRuns final {
   explicit ShownRuns(std::vector<double> setupValues, int firstRuns = 0)
       : initial_(std::move(setupValues)), firstRuns_(firstRuns) {}
 
-  /// The model run of an evaluation with these values (model scale) begins in the slot. They may begin in any order.
-  void begin(int slot, int number, std::vector<double> parameterValues);
+  /// The model run of an evaluation with these values (model scale) begins in the slot. They may begin in any order. A
+  /// final model run is shown in any case: it has the set that the search took, which need not be the one with the
+  /// least aggregate.
+  void begin(int slot, int number, std::vector<double> parameterValues, bool isFinal = false);
 
   /// Whether the slot's run, which has succeeded with this aggregate, may be shown: if it is the initial one of this
   /// process so far, or not worse than any before (of equals a search may take any). A run whose aggregate is not known
@@ -32,6 +34,7 @@ class ShownRuns final {
   struct Run {
     int number = 0;
     std::vector<double> parameterValues;
+    bool isFinal = false;
   };
   /// Of the initial evaluation nothing is asked here.
   bool isShownAnyhow(const Run& run, double aggregate) const;

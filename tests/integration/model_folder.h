@@ -115,7 +115,7 @@ class ModelFolder : public TemporaryFolder {
     const std::string surrogate =
         settings.usesSurrogate
             ? "    Use_Surrogate_Model = 1\n    [SURROGATE_MODEL_PARAMETERS]\n      Neighbourhood_Size = "
-              "20\n      No_Initial_Generations = 2\n    [/SURROGATE_MODEL_PARAMETERS]\n"
+              "18\n      No_Initial_Generations = 2\n    [/SURROGATE_MODEL_PARAMETERS]\n"
             : "    Use_Surrogate_Model = 0\n";
     const std::string search =
         settings.search.empty() ? fmt::format("{}", settings.algorithm) : fmt::format("'{}'", settings.search);

@@ -151,6 +151,7 @@ TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {
                                       {.algorithm = 1, .usesSurrogate = true},
                                       {.search = "OPSE"},
                                       {.search = "CMA-ES"},
+                                      {.search = "CMA-ES", .usesSurrogate = true},
                                       {.search = "GLM"}}) {
     writeSetup(settings);
     run();

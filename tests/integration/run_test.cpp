@@ -91,8 +91,9 @@ TEST(Optimisation, ResultsAreTheSameBitsWhateverOrderTheModelRunsEndIn) {
   folder.useScript(kSleepByParameters);
   for (RunSettings settings :
        {RunSettings{.algorithm = 1, .maxEvaluations = 50}, RunSettings{.search = "OPSE", .maxEvaluations = 50},
-        RunSettings{.search = "CMA-ES", .maxEvaluations = 50}, RunSettings{.search = "GLM", .maxEvaluations = 30},
-        RunSettings{.option = 3, .maxEvaluations = 40}}) {
+        RunSettings{.search = "CMA-ES", .maxEvaluations = 50},
+        RunSettings{.search = "CMA-ES", .usesSurrogate = true, .maxEvaluations = 50},
+        RunSettings{.search = "GLM", .maxEvaluations = 30}, RunSettings{.option = 3, .maxEvaluations = 40}}) {
     std::string ofOneSlot;
     for (const int slots : {1, 3, 8}) {
       settings.slots = slots;

@@ -115,6 +115,14 @@ double CmaDistribution::lengthOf(std::span<const double> step) const {
   return lengthOfVector(whitened(step));
 }
 
+void CmaDistribution::limitLength(std::vector<double>& step) const {
+  const auto n = static_cast<double>(step.size());
+  const double most = std::sqrt(n) + 2.0 * n / (n + 2.0);
+  const double length = lengthOf(step);
+  if (length <= most) return;
+  for (double& value : step) value *= most / length;
+}
+
 double CmaDistribution::deviation(std::size_t j) const {
   return sigma_ * widening_[j] * std::sqrt(variance(j));
 }

@@ -41,6 +41,9 @@ class CmaDistribution final {
   std::vector<double> stepTo(std::span<const double> point) const;
   /// √(yᵀ·C⁻¹·y).
   double lengthOf(std::span<const double> step) const;
+  /// Shortens a step that was not drawn to the length that a drawn one usually has at most: Hansen (2011), Injecting
+  /// external solutions into CMA-ES, arXiv:1110.4181.
+  void limitLength(std::vector<double>& step) const;
 
   /// Takes the λ steps of a generation, best first.
   void update(std::span<const std::vector<double>* const> ranked);

@@ -33,16 +33,6 @@ std::vector<double> stepCounts(const SearchBounds& bounds) {
   return counts;
 }
 
-/// A step that was not drawn is not longer than a drawn one usually is: Hansen (2011), Injecting external solutions
-/// into CMA-ES, arXiv:1110.4181.
-void limitLength(std::vector<double>& step, const CmaDistribution& distribution) {
-  const auto n = static_cast<double>(step.size());
-  const double most = std::sqrt(n) + 2.0 * n / (n + 2.0);
-  const double length = distribution.lengthOf(step);
-  if (length <= most) return;
-  for (double& value : step) value *= most / length;
-}
-
 }  // namespace
 
 CmaEs::CmaEs(const CmaEsSettings& settings, SearchProblem problem)
@@ -88,9 +78,12 @@ SearchStatus CmaEs::initialise() {
   feasible_.replaceInSample(sample, given, problem_.bounds, problem_.random);
   std::vector<EvaluationResult> results = run(sample);
   problem_.evaluator.settleAggregates(results);
+  if (problem_.selector != nullptr) surrogate_.emplace(problem_.selector->settings(), problem_.bounds.size());
   std::size_t best = 0;
   for (std::size_t i = 0; i < count; ++i) {
     noteBest(sample[i], results[i]);
+    const auto value = isUsable(results[i]) ? std::optional(results[i].aggregate) : std::nullopt;
+    if (surrogate_) surrogate_->note(problem_.selector->scaled(sample[i]), value);
     if (isBetter(results[i].aggregate, results[best].aggregate)) best = i;
   }
   startRun(restarts_.first(), best < given ? relative(summary_.best) : centreOf(sample, results));
@@ -139,21 +132,13 @@ SearchStatus CmaEs::advance() {
   if (!distribution_) return kSearchNotInitialised;
   if (isTerminated()) return kSearchOk;
   std::vector<Point> points = drawGeneration();
-  const auto count = std::min(points.size(), static_cast<std::size_t>(std::max(0, budgetLeft())));
-  const bool isCut = count < points.size();
-  points.resize(count);
-  std::vector<ParameterSet> sets;
-  sets.reserve(points.size());
-  for (const Point& point : points) sets.push_back(point.set);
-  std::vector<EvaluationResult> results = run(sets);
-  for (std::size_t i = 0; i < count; ++i) {
-    points[i].result = std::move(results[i]);
-    noteBest(points[i].set, points[i].result);
-    if (isBetter(points[i].result.aggregate, bestOfRun_)) bestOfRun_ = points[i].result.aggregate;
-  }
+  const bool hasModel = surrogate_ && surrogate_->isActive(summary_.loopCount) && surrogate_->fit(*distribution_);
+  std::vector<std::size_t> all(points.size());
+  std::iota(all.begin(), all.end(), std::size_t{0});
+  const bool isWhole = hasModel ? runWithModel(points) : runPoints(points, all);
   ++summary_.loopCount;
   noteGeneration(points);
-  if (!isCut) learnFrom(points);
+  if (isWhole) learnFrom(points);
   if (budgetLeft() <= 0) {
     noteRun("was going on when the budget was used up");
     summary_.terminationMessage = kBudgetUsedMessage;
@@ -165,6 +150,25 @@ SearchStatus CmaEs::advance() {
     endRun("it has used up its share of the evaluations");
   }
   return kSearchOk;
+}
+
+bool CmaEs::runPoints(std::vector<Point>& points, std::span<const std::size_t> which) {
+  const auto count = std::min(which.size(), static_cast<std::size_t>(std::max(0, budgetLeft())));
+  std::vector<ParameterSet> sets;
+  sets.reserve(count);
+  for (const std::size_t i : which.first(count)) sets.push_back(points[i].set);
+  std::vector<EvaluationResult> results = run(sets);
+  for (std::size_t k = 0; k < count; ++k) {
+    Point& point = points[which[k]];
+    point.result = std::move(results[k]);
+    point.isRun = true;
+    point.value.reset();
+    if (isUsable(point.result)) point.value = point.result.aggregate;
+    noteBest(point.set, point.result);
+    if (isBetter(point.result.aggregate, bestOfRun_)) bestOfRun_ = point.result.aggregate;
+    if (surrogate_) surrogate_->note(problem_.selector->scaled(point.set), point.value);
+  }
+  return count == which.size();
 }
 
 std::vector<CmaEs::Point> CmaEs::drawGeneration() {
@@ -185,7 +189,7 @@ CmaEs::Point CmaEs::drawPoint() {
   if (set != point.set) {
     point.set = std::move(set);
     point.step = distribution_->stepTo(relative(point.set));
-    limitLength(point.step, *distribution_);
+    distribution_->limitLength(point.step);
     point.place = relative(point.set);
   }
   return point;
@@ -194,12 +198,12 @@ CmaEs::Point CmaEs::drawPoint() {
 void CmaEs::learnFrom(std::vector<Point>& points) {
   std::vector<double> values;
   for (const Point& point : points) {
-    if (isUsable(point.result)) values.push_back(point.result.aggregate);
+    if (point.value) values.push_back(*point.value);
   }
   bounds_->adapt(*distribution_, values);
   for (Point& point : points) {
-    point.rank = isUsable(point.result) ? point.result.aggregate + bounds_->penalty(point.place, *distribution_)
-                                        : distribution_->lengthOf(point.step);
+    point.rank = point.value ? *point.value + bounds_->penalty(point.place, *distribution_)
+                             : distribution_->lengthOf(point.step);
   }
   std::stable_sort(points.begin(), points.end(), [this](const Point& a, const Point& b) { return isAhead(a, b); });
   std::vector<const std::vector<double>*> steps;
@@ -207,16 +211,19 @@ void CmaEs::learnFrom(std::vector<Point>& points) {
   for (const Point& point : points) steps.push_back(&point.step);
   distribution_->update(steps);
   const Point& early = points[static_cast<std::size_t>(0.7 * static_cast<double>(points.size()))];
-  if (isUsable(early.result) && early.rank == points.front().rank) distribution_->widen();
+  if (early.value && early.rank == points.front().rank) distribution_->widen();
   margin_.keepOpen(*distribution_);
+  values.clear();  // predictions tell nothing of the end of a run
+  for (const Point& point : points) {
+    if (point.isRun && point.value) values.push_back(*point.value);
+  }
   std::sort(values.begin(), values.end());
   tests_->update(*distribution_, margin_, values);
   change_->update(bestOfRun_, 0, std::numeric_limits<double>::infinity());
 }
 
 bool CmaEs::isAhead(const Point& a, const Point& b) const {
-  const bool isUsableA = isUsable(a.result);
-  if (isUsableA != isUsable(b.result)) return isUsableA;
+  if (a.value.has_value() != b.value.has_value()) return a.value.has_value();
   return a.rank < b.rank;
 }
 
@@ -271,8 +278,10 @@ const SearchFacts& CmaEsMethod::facts() const {
   static constexpr SearchFacts kFacts{.name = {std::nullopt, "CMA-ES"},
                                       .longName = "Covariance Matrix Adaptation Evolution Strategy",
                                       .runsInParallel = true,
+                                      .usesSurrogate = true,
                                       .drawsInitialSample = true,
                                       .needsRanges = true,
+                                      .modelChooses = "at least one",
                                       .populationKeywords = kPopulationKeyword};
   return kFacts;
 }

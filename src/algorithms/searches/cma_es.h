@@ -9,6 +9,7 @@
 #include "algorithms/searches/cma_distribution.h"
 #include "algorithms/searches/cma_margin.h"
 #include "algorithms/searches/cma_restarts.h"
+#include "algorithms/searches/cma_surrogate.h"
 #include "algorithms/searches/cma_tests.h"
 #include "algorithms/searches/feasible_points.h"
 #include "algorithms/searches/population.h"
@@ -32,6 +33,13 @@ struct CmaEsSettings {
 /// failed points rank behind all others, and of two the one nearer to the mean is the better one, so that steps become
 /// smaller where all fail; a point that violates a constraint is drawn again and finally drawn back towards the mean;
 /// differences of values are negligible in relation to the values.
+///
+/// With a surrogate model only a part of a generation is run: the points that the model ranks first, and more until it
+/// ranks the parents no differently with the new results. This is the approximate ranking of Kern, Hansen and
+/// Koumoutsakos (2006), doi:10.1007/11844297_95, with the criterion of Bouzarkouna, Auger and Ding (2010),
+/// doi:10.1007/978-3-642-12239-2_54. Beyond these, the minimum that the model predicts takes the place of one point of
+/// the generation, its step limited in length after Hansen (2011), arXiv:1110.4181; and the model may be a Gaussian
+/// process.
 class CmaEs final : public SearchAlgorithm {
  public:
   CmaEs(const CmaEsSettings& settings, SearchProblem problem);
@@ -47,7 +55,9 @@ class CmaEs final : public SearchAlgorithm {
     std::vector<double> place;  ///< relative to the bounds, maybe outside them
     ParameterSet set;
     EvaluationResult result;
-    double rank = 0.0;  ///< value with penalty, or length of the step if it failed
+    bool isRun = false;
+    std::optional<double> value;  ///< of its run, or predicted; empty if it failed or is likely to
+    double rank = 0.0;            ///< value with penalty, or length of the step if it failed
   };
 
   bool isProblemValid() const;
@@ -58,6 +68,14 @@ class CmaEs final : public SearchAlgorithm {
   void endRun(std::string_view reason);
   Point drawPoint();
   std::vector<Point> drawGeneration();
+  /// Runs the points with these places in the generation; false if the budget ends before.
+  bool runPoints(std::vector<Point>& points, std::span<const std::size_t> which);
+  /// Runs as many of the points as the model leaves undecided, and gives the others its values.
+  bool runWithModel(std::vector<Point>& points);
+  std::size_t takeKnown(std::vector<Point>& points) const;
+  /// Puts the minimum that the model predicts in the place of the last point; false if there is none to be run.
+  bool proposeMinimum(std::vector<Point>& points) const;
+  void predict(std::vector<Point>& points) const;
   void learnFrom(std::vector<Point>& points);
   bool isAhead(const Point& a, const Point& b) const;
   std::vector<EvaluationResult> run(std::span<const ParameterSet> sets);
@@ -83,6 +101,9 @@ class CmaEs final : public SearchAlgorithm {
   double bestOfRun_ = 0.0;
   int startedAt_ = 0;  ///< evaluations before the run
   int runCount_ = 0;
+
+  std::optional<CmaSurrogate> surrogate_;
+  std::size_t firstRuns_ = 0;  ///< of a generation, before the model is asked again; 0: not known yet
 };
 
 /// CMA-ES as a setup selects it.

@@ -31,6 +31,7 @@ struct SearchFacts {
   /// Of a search that does not fill several slots: what a job of several processes runs at once all the same.
   std::string_view runsAtOnceUnderMpi = {};
   bool findsFront = false;                   ///< each objective function is an objective of its own; it needs several
+  std::string_view modelChooses = "one";     ///< how many of the proposals for one run a surrogate model chooses
   std::string_view populationKeywords = {};  ///< "Population_Size"; empty if it has no population
   std::string_view whyNotRepeated = {};      ///< why repetitions of it are refused; empty if they are not
 };

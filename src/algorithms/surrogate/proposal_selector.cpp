@@ -42,11 +42,6 @@ double squaredDistance(const std::vector<double>& a, const std::vector<double>& 
   return sum;
 }
 
-std::unique_ptr<SurrogateModel> makeModel(SurrogateModelType type) {
-  if (type == SurrogateModelType::gaussianProcess) return std::make_unique<GaussianProcess>();
-  return std::make_unique<QuadraticSurrogate>();
-}
-
 /// That a neighbourhood that is given suffices for a polynomial.
 std::optional<SettingRefusal> validateNeighbourhood(const SurrogateSettings& settings, std::size_t n) {
   const std::int32_t size = settings.neighbourhoodSize;
@@ -150,6 +145,11 @@ std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n) 
                                                                    : 3 * coefficients / 2;
 }
 
+std::unique_ptr<SurrogateModel> makeSurrogateModel(SurrogateModelType type) {
+  if (type == SurrogateModelType::gaussianProcess) return std::make_unique<GaussianProcess>();
+  return std::make_unique<QuadraticSurrogate>();
+}
+
 std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n) {
   // Fewer points than determine a plane tell nothing about the shape of the objective.
   return settings.modelType == SurrogateModelType::quadraticPolynomial ? quadraticCoefficientCount(n) : n + 2;
@@ -164,7 +164,7 @@ ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBoun
     : settings_(settings),
       bounds_(std::move(bounds)),
       feasibility_(std::move(feasibility)),
-      model_(makeModel(settings.modelType)) {
+      model_(makeSurrogateModel(settings.modelType)) {
   lapack();  // what the models need is missed now, if ever, and not after the initial sample
 }
 

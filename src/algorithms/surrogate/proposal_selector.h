@@ -47,6 +47,7 @@ std::string_view surrogateModelName(const SurrogateSettings& settings);
 /// The largest number of evaluated sets of n parameters to which the model is fitted: as set or, where that is 0, the
 /// default for the model type.
 std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n);
+std::unique_ptr<SurrogateModel> makeSurrogateModel(SurrogateModelType type);
 /// The number of evaluated sets needed before the model is used.
 std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n);
 /// How many proposals are made for each one that is run: 100 / samplingRate, rounded up.
@@ -60,6 +61,10 @@ class ProposalSelector final {
  public:
   /// Points that cannot be run are no minima; proposals are not asked about.
   ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds, Feasibility feasibility = {});
+
+  const SurrogateSettings& settings() const { return settings_; }
+  /// The set relative to the bounds, with integer parameters as the model takes them.
+  std::vector<double> scaled(const ParameterSet& set) const;
 
   /// Remembers an evaluated point. A failed point is left out of fits, which its substitute value would distort, but is
   /// not run again. A repeated point is dropped: it would crowd others out of the neighbourhood.
@@ -81,8 +86,6 @@ class ProposalSelector final {
   std::vector<PredictedMinimum> minima(std::span<const ParameterSet> centres);
 
  private:
-  /// The set relative to the bounds, with integer parameters as the model takes them.
-  std::vector<double> scaled(const ParameterSet& set) const;
   ParameterSet unscaled(const std::vector<double>& point) const;
   /// Whether that very point, relative to the bounds, has been evaluated.
   bool isKnown(const std::vector<double>& point) const;

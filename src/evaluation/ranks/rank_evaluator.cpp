@@ -85,7 +85,7 @@ bool RankEvaluator::startNext(int rank) {
     if (!failure) {
       job_.send(rank, static_cast<int>(RankMessage::set),
                 encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place), ledger_.standard(),
-                                  ledger_.repeatedMeasures(*place)}));
+                                  ledger_.repeatedMeasures(*place), ledger_.isFinalRun()}));
       worker(rank).set = *place;
       watch_.handOut(rank, ledger_.numberOf(*place));
       noteWhetherFree(rank);

@@ -13,7 +13,7 @@ struct Layout<BeginMessage> {
 template <>
 struct Layout<SetMessage> {
   static void of(auto& archive, auto& message) {
-    archive(message.number, message.set, message.standard, message.repeatedMeasures);
+    archive(message.number, message.set, message.standard, message.repeatedMeasures, message.isFinal);
   }
 };
 template <>

@@ -61,6 +61,7 @@ struct SetMessage {
   ParameterSet set;
   RunStandard standard;
   std::vector<double> repeatedMeasures;  ///< of the row that the evaluation has, if its model is run again beside it
+  bool isFinal = false;                  ///< the best set of a search, run once more
 };
 
 struct ResultMessage {

@@ -64,7 +64,7 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
                                       LifeSigns& signs) {
   signs.begin();
   runner.setStandard(message.standard);
-  if (auto failure = runner.prepareModelRun(message.set, kSlot, message.number))
+  if (auto failure = runner.prepareModelRun(message.set, kSlot, message.number, message.isFinal))
     return ResultMessage{runner.failedResult(*failure), {}, {}};
   while (isExecuting(runner)) {
     runner.launcher().waitForChange(kBusyPollSeconds);

@@ -486,9 +486,9 @@ std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space
   if (repetitions.count > 1) lines.push_back(repetitionsText(repetitions, stopping, randomSeed));
   if (!usesSurrogate()) return lines;
   lines.push_back(fmt::format(
-      "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}{}",
-      surrogateModelName(surrogate), neighbourhoodSize(surrogate, space.size()), proposalsPerRun(surrogate),
-      surrogate.initialGenerations,
+      "Surrogate model: {} fitted to the {} nearest sets, chooses {} of {} proposals; loops without it: {}{}",
+      surrogateModelName(surrogate), neighbourhoodSize(surrogate, space.size()), method->facts().modelChooses,
+      proposalsPerRun(surrogate), surrogate.initialGenerations,
       surrogate.checkInterval > 0 ? fmt::format(", then one in {}", surrogate.checkInterval) : ""));
   return lines;
 }
