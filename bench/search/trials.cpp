@@ -59,8 +59,8 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   // With noise what counts is what the chosen set is really worth.
   const double best = setting.noise > 0.0 ? function.value(search->summary().best) : evaluator.bestInTime;
   evaluator.bestAfter.resize(setting.checkpoints.size(), best);  // a search may end before
-  return {evaluator.hasHitTarget(), evaluator.evaluationsToTarget, best, evaluator.evaluations,
-          std::move(evaluator.bestAfter)};
+  return {evaluator.hasHitTarget(), evaluator.evaluationsToTarget, best, std::move(evaluator.bestAfter),
+          evaluator.evaluations};
 }
 
 std::vector<Outcome> runTrials(const std::function<TestFunction(int)>& functionOf, const Setting& setting, int trials) {

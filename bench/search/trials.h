@@ -49,11 +49,10 @@ struct Setting {
 
 struct Outcome {
   bool isSuccess = false;
-  bool isSuccess = false;
-  int evaluations = 0;  ///< until the first value within the tolerance of the optimum
-  double best = 0.0;    ///< without noise, and found within the time
-  int evaluationsMade = 0;
+  int evaluations = 0;                 ///< until the first value within the tolerance of the optimum
+  double best = 0.0;                   ///< without noise, and found within the time
   std::vector<double> bestAfter = {};  ///< for each of the checkpoints
+  int evaluationsMade = 0;
 };
 
 /// Evaluates a function; counts the evaluations and records when a value is first within the tolerance of the optimum.

@@ -55,7 +55,7 @@ std::optional<double> CmaSurrogate::valueOf(const std::vector<double>& place) co
 }
 
 bool CmaSurrogate::isActive(int loop) const {
-  return loop >= settings_.initialGenerations && places_.size() >= leastSetCount(settings_, n_);
+  return mayAskModel(settings_, loop) && places_.size() >= leastSetCount(settings_, n_);
 }
 
 /// D⁻¹·Bᵀ·y of the place.

@@ -219,10 +219,14 @@ void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& res
   values_.push_back(result.aggregate);
 }
 
+bool mayAskModel(const SurrogateSettings& settings, int loop) {
+  const int past = loop - settings.initialGenerations;
+  const bool isCheck = settings.checkInterval > 0 && past % settings.checkInterval == settings.checkInterval - 1;
+  return past >= 0 && !isCheck;
+}
+
 bool ProposalSelector::isActive(int loop) const {
-  const int past = loop - settings_.initialGenerations;
-  const bool isCheck = settings_.checkInterval > 0 && past % settings_.checkInterval == settings_.checkInterval - 1;
-  return past >= 0 && !isCheck && points_.size() >= leastSetCount(settings_, bounds_.size());
+  return mayAskModel(settings_, loop) && points_.size() >= leastSetCount(settings_, bounds_.size());
 }
 
 std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& point) const {

@@ -48,6 +48,8 @@ std::string_view surrogateModelName(const SurrogateSettings& settings);
 /// default for the model type.
 std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n);
 std::unique_ptr<SurrogateModel> makeSurrogateModel(SurrogateModelType type);
+/// Whether a model that has enough evaluated sets is asked in this loop, the first being 0.
+bool mayAskModel(const SurrogateSettings& settings, int loop);
 /// The number of evaluated sets needed before the model is used.
 std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n);
 /// How many proposals are made for each one that is run: 100 / samplingRate, rounded up.
