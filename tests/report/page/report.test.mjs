@@ -371,13 +371,16 @@ function ofDimensions(count) {
 test('chains say whether they have converged, what to do, which parameters trade off, and how much lies in the bands', async () => {
   const data = sample.dataOf('dream');
   data.posterior.tradeOffs = ['sigma0 of flow and phi of flow trade off: a correlation of -0.86'];
+  Object.assign(data.band[1], { inside: 1 });
+  const { burnIn } = data.posterior;
   await withReport(data, {}, async (page) => {
     const shown = await page.locator('#posterior').textContent();
     assert.equal(await page.locator('#posterior .findings .warning').count(), 1);
-    for (const text of ['The chains have not converged: R-hat is above 1.05 for b (1.72), sigma0 of flow (1.54)', 'The log-likelihood still rises behind burn-in', 'sigma0 of flow and phi of flow trade off: a correlation of -0.86',
-      'holds 100 % of 365 observed values; it should hold about 90 %. It is wider', 'what follows is not the posterior yet', '4 chains of 121 generations; the first 24 are burn-in']) assert.ok(shown.includes(text), text);
+    assert.match(shown, /The chains have not converged: R-hat is above 1\.05 for .*\bb \(\d\.\d/);
+    for (const text of ['sigma0 of flow and phi of flow trade off: a correlation of -0.86',
+      'holds 100 % of 365 observed values; it should hold about 90 %. It is wider', 'what follows is not the posterior yet', `4 chains of 121 generations; the first ${burnIn} are burn-in`]) assert.ok(shown.includes(text), text);
     const shaded = await page.$$eval('#posterior figure', (figures) => figures.map((figure) => window.drawnOptions(figure)?.series[0].markArea?.data?.[0]?.[1]?.xAxis).filter((end) => end));
-    assert.deepEqual(shaded, [24, 24, 24, 24, 24], 'the burn-in of each trace');
+    assert.deepEqual(shaded, Array(5).fill(burnIn), 'the burn-in of each trace');
     const limits = await page.$$eval('#posterior figure', (figures) => figures.map((figure) => window.drawnOptions(figure)?.series[0].markLine?.data?.[0]?.yAxis).filter((limit) => limit));
     assert.deepEqual(limits, [1.05, 400]);
     assert.ok(!shown.includes('The data have narrowed'), 'what chains that are apart have not found');
