@@ -60,7 +60,7 @@ class EvaluationLedger final {
   const ParameterSet& set(std::size_t place) const { return sets_[indexOf(place)]; }
   /// The set's number in the run, from 1.
   static int numberOf(std::size_t place) { return static_cast<int>(place) + 1; }
-  /// Whether the open set is the best one of a search, run once more.
+  /// Whether the open set is the one with which a search ends, run once more.
   bool isFinalRun() const { return isFinalRun_; }
   /// By what the model run of the set taken last is judged.
   RunStandard standard() const { return runComparison_.standard(); }

@@ -328,7 +328,11 @@ std::vector<std::string> RunReporter::comparisonLines() const {
   const std::set<int> kept = numbersWithPairs();  // more are there until the end, which ones depends on the machine
   int number = firstSuccess_;
   std::string whose = fmt::format("the first successful run, No. {},", number);
-  if (best() && (kept.contains(best()->number) || finalRun_)) {
+  const bool isOfOther = finalRunOf_ != 0 && best() && finalRunOf_ != best()->number;
+  if (finalRun_ && isOfOther) {
+    number = *finalRun_;
+    whose = fmt::format("the suggested compromise, No. {},", finalRunOf_);
+  } else if (best() && (kept.contains(best()->number) || finalRun_)) {
     number = kept.contains(best()->number) ? best()->number : *finalRun_;
     whose = fmt::format("the best evaluation, No. {},", best()->number);
   }

@@ -176,7 +176,7 @@ class RunReporter final : public EvaluationObserver {
   } lastWithPairs_;
   bool searchHasEnded_ = false;
   int finalRunOf_ = 0;                   ///< the evaluation that the final run repeats; 0: the best
-  std::optional<int> finalRun_;          ///< of a search: repeats the best set
+  std::optional<int> finalRun_;          ///< of a search: repeats the best set, or that of finalRunOf_
   std::set<int> others_;                 ///< evaluations without such a difference, with pairs of other observations
   std::size_t differencesWarnedOf_ = 0;  ///< one by one
   int runsWithProcessesLeft_ = 0;

@@ -106,7 +106,8 @@ bool CmaEs::runWithModel(std::vector<Point>& points) {
     if (!surrogate_->fit(*distribution_)) break;
     predict(points);
     const Ranking now = rankingNow();
-    // Bouzarkouna, Auger and Ding (2010): the parents are the same, or, with a quarter of the generation run, the best.
+    // A form of what Bouzarkouna, Auger and Ding (2010) ask for: the parents are the same, or, with a quarter of the
+    // generation run, the best.
     if (now.parents == before.parents || (now.best == before.best && 4 * made >= lambda)) break;
     before = now;
     const std::vector<std::size_t> next = bestLeft(now, batch);

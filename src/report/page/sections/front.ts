@@ -69,7 +69,7 @@ function growth({ course }: Front): Finding[] {
   if (before === undefined || !(final > 0)) return [];
   const share = (final - course.hypervolumes[before]!) / final;
   return share > kStillGrows
-    ? [{ kind: 'warning', text: `The front still grew: its hypervolume by ${percent(share, 2)} in the last third of the evaluations. A longer run would find a better one.` }]
+    ? [{ kind: 'warning', text: `The front still grew: its hypervolume by ${percent(share, 2)} in the last third of the evaluations. More evaluations, or another seed, may find a better one.` }]
     : [{ kind: 'good', text: `The front has settled: its hypervolume grew by ${percent(Math.max(0, share), 2)} in the last third of the evaluations.` }];
 }
 
