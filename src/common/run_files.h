@@ -100,9 +100,9 @@ inline constexpr RunFile kRepetitionRows{"_Optimisation_RepetitionRows", ".dat"}
 inline constexpr RunFile kPareto{"_Pareto", ".dat", false, true};
 inline constexpr RunFile kParetoCourse{"_ParetoCourse", ".dat", false, true};
 inline constexpr RunFile kParetoSeries{"_ParetoSeries", ".dat", false, true};
-inline constexpr std::array kSearchTables{kEstimateCovariance, kEstimateCorrelation, kEstimateLimits,
-                                          kEstimateJacobian,   kRepetitions,         kRepetitionRows,
-                                          kPareto,             kParetoCourse,        kParetoSeries};
+inline constexpr std::array kSearchTables{kEstimateCovariance, kEstimateCorrelation, kEstimateLimits, kEstimateJacobian,
+                                          kRepetitions,        kRepetitionRows,      kPareto,         kParetoCourse,
+                                          kParetoSeries};
 
 /// What all tasks call alike behind their own stem.
 constexpr RunFile restartFile(std::string_view stem) {

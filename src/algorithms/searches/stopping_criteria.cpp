@@ -82,8 +82,8 @@ std::vector<std::string> StoppingTests::reasons() const {
                                 formatReal(criteria_.minChange)));
   }
   if (isRangeSmall()) {
-    lines.push_back(fmt::format("Range of the population, of the bounds: {:.6g}, less than {} = {}",
-                                populationRange_, kRangeKeyword, formatReal(criteria_.minPopulationRange)));
+    lines.push_back(fmt::format("Range of the population, of the bounds: {:.6g}, less than {} = {}", populationRange_,
+                                kRangeKeyword, formatReal(criteria_.minPopulationRange)));
   }
   return lines;
 }
