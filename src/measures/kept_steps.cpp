@@ -35,9 +35,8 @@ std::vector<std::int64_t> readSteps(const SeriesReference& simulation, const Dat
   }
   if (seconds.empty()) {
     fatalError("Error: No simulated steps for the band in " + std::string(trimTrailing(simulation.fileName)),
-               fmt::format("{}Band_Times = 'steps' takes the times from this file as it is in the model's folder, and "
-                           "there it has no time step from {} to {}\nRun the model in its folder, or set Band_Times = "
-                           "'observations'",
+               fmt::format("{}The times of 'steps' are taken from this file as it is in the model's folder, and there "
+                           "it has no time step from {} to {}\nRun the model in its folder, or select 'observations'",
                            simulation.fileLocation, formatDate(first), formatDate(last)));
   }
   return seconds;

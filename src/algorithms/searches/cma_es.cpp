@@ -296,7 +296,7 @@ BoundSection CmaEsMethod::section() {
                 [](auto& m) -> auto& { return m.settings.populationSize; },
                 {.name = kPopulationKeyword,
                  .defaultValue = "0",
-                 .range = from(0),
+                 .range = between(0, 1000000),
                  .refusal = kPopulationRefusal,
                  .meaning = "Points of a generation and model runs of a batch, λ; 0: 4 + ⌊3 ln n⌋ for n variable "
                             "parameters. More for rugged objective functions, or for more slots."}),

@@ -232,7 +232,7 @@ BoundSection NsgaIiMethod::section() {
                 [](auto& m) -> auto& { return m.settings.populationSize; },
                 {.name = kPopulationKeyword,
                  .defaultValue = "100",
-                 .range = from(2),
+                 .range = between(2, 1000000),
                  .refusal = "Error: Population size in NSGA-II algorithm invalid",
                  .meaning = "Points of the population and model runs of a generation, which is one batch."}),
             setting<Method>([](auto& m) -> auto& { return m.settings.crossoverProbability; },

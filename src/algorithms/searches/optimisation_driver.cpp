@@ -14,8 +14,7 @@ namespace {
 constexpr int kLoopsBetweenReports = 10;
 constexpr std::string_view kNegativeAggregate =
     "Warning: The best objective value is negative. The convergence test divides by the sum of two best values and "
-    "will "
-    "hold as soon as No_Loops_Convergence loops have been made";
+    "will hold as soon as No_Loops_Convergence loops have been made";
 
 void checkStatus(SearchStatus status, std::string_view algorithm) {
   if (status == kSearchOk) return;
@@ -38,7 +37,9 @@ SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, con
                         int evaluationLimit) {
   try {
     checkStatus(search.initialise(), algorithm);
-    if (periodicStep && search.summary().bestResult.aggregate < 0.0) periodicStep(kNegativeAggregate);
+    if (periodicStep && search.comparesBestValues() && search.summary().bestResult.aggregate < 0.0) {
+      periodicStep(kNegativeAggregate);
+    }
     while (!search.isTerminated() && search.summary().evaluationCount < evaluationLimit) {
       checkStatus(search.advance(), algorithm);
       const bool isTimeForReport = search.isTerminated() || search.summary().loopCount % kLoopsBetweenReports == 0;

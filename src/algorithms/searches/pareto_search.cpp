@@ -50,9 +50,8 @@ ParetoPoint ParetoSearch::take(const ParameterSet& set, const EvaluationResult& 
     summary_.bestResult = result;
   }
   ParetoPoint point{result.number, set, {result.objectiveValues, 0.0}};
-  const bool isKnown = result.ok() && std::ranges::all_of(result.objectiveValues, [](double value) {
-                         return std::isfinite(value) && value < kFailedRunValue;
-                       });
+  const bool isKnown =
+      result.ok() && std::ranges::all_of(result.objectiveValues, [](double value) { return std::isfinite(value); });
   bool entered = false;
   if (isKnown) {
     entered = problem_.pareto->archive.add(result.number, set, result.objectiveValues);

@@ -51,9 +51,10 @@ inline constexpr std::string_view kHypervolumeSettledMessage =
 
 /// What NSGA-II and PADDS have in common: each objective function is an objective of its own, all are minimised; a
 /// failed run ranks behind all others and is never on the front, and so do sets that violate constraints, which come
-/// from the setup alone, as every proposal can be run. The best set is that of the least aggregate, one of the front.
+/// from the setup alone, as every proposal can be run. The best set is that of the least aggregate.
 class ParetoSearch : public SearchAlgorithm {
  public:
+  bool comparesBestValues() const final { return false; }
   bool isTerminated() const final { return !summary_.terminationMessage.empty(); }
   const SearchSummary& summary() const final { return summary_; }
 
@@ -91,36 +92,41 @@ struct ParetoRefusals {
 /// The rows of the keywords that these searches have in common. `Method` has the members `pareto` and `kRefusals`.
 template <class Method>
 std::vector<KeywordRow> paretoKeywordRows() {
-  return {setting<Method>([](auto& m) -> auto& { return m.pareto.hypervolumeEvaluations; },
-                          {.name = "Hypervolume_Evaluations",
-                           .defaultValue = "0",
-                           .range = from(0),
-                           .refusal = Method::kRefusals.evaluations,
-                           .meaning = "The search ends when the hypervolume of the front has grown by less than "
-                                      "`Hypervolume_Change` over so many evaluations. 0: it ends with its budget."}),
-          setting<Method>([](auto& m) -> auto& { return m.pareto.hypervolumeChange; },
-                          {.name = "Hypervolume_Change",
-                           .defaultValue = "0.001",
-                           .range = kNonNegative,
-                           .refusal = Method::kRefusals.change,
-                           .meaning = "That share of the hypervolume."}),
-          setting<Method>(
-              [](auto& m) -> auto& { return m.pareto.referencePoint; },
-              {.name = kReferencePointKeyword,
-               .defaultValue = kNoDefault,
-               .meaning = "One value for each objective function: the point up to which the hypervolume counts. "
-                          "Without it a tenth of the front's range behind the greatest value of each."}),
-          choice<Method>(
-              [](Method& m, const SetupValue& value) {
-                for (std::size_t i = 0; i < std::size(kFrontSeriesNames); ++i) {
-                  if (isCode(kFrontSeriesNames[i], value)) m.pareto.series = static_cast<FrontSeries>(i);
-                }
-              },
-              {.name = kFrontSeriesKeyword,
-               .defaultValue = "'observations'",
-               .codes = kFrontSeriesNames,
-               .meaning = "At which times the simulated series of the front are kept: those of the observations, every "
-                          "simulated step as well, or none. The series of all evaluations are on disk until then."})};
+  return {
+      setting<Method>([](auto& m) -> auto& { return m.pareto.hypervolumeEvaluations; },
+                      {.name = "Hypervolume_Evaluations",
+                       .defaultValue = "0",
+                       .range = from(0),
+                       .refusal = Method::kRefusals.evaluations,
+                       .meaning = "The search ends when the hypervolume of the front has grown by less than "
+                                  "`Hypervolume_Change` over so many evaluations. 0: it ends with its budget."}),
+      setting<Method>([](auto& m) -> auto& { return m.pareto.hypervolumeChange; },
+                      {.name = "Hypervolume_Change",
+                       .defaultValue = "0.001",
+                       .range = kNonNegative,
+                       .refusal = Method::kRefusals.change,
+                       .meaning = "That share of the hypervolume."}),
+      setting<Method>(
+          [](auto& m) -> auto& { return m.pareto.referencePoint; },
+          {.name = kReferencePointKeyword,
+           .defaultValue = kNoDefault,
+           .range = between(-1.0e100, 1.0e100),
+           .refusal = "Error: Reference point invalid",
+           .meaning = "One value for each objective function: the point up to which the hypervolume counts. "
+                      "Without it a tenth of the front's range behind the greatest value of each."}),
+      choice<Method>(
+          [](Method& m, const SetupValue& value) {
+            for (std::size_t i = 0; i < std::size(kFrontSeriesNames); ++i) {
+              if (isCode(kFrontSeriesNames[i], value)) m.pareto.series = static_cast<FrontSeries>(i);
+            }
+          },
+          {.name = kFrontSeriesKeyword,
+           .defaultValue = "'observations'",
+           .codes = kFrontSeriesNames,
+           .meaning =
+               "At which times the simulated series of the front are kept: those of the observations, every "
+               "simulated step as well, or none. The series of all evaluations are kept on disk for it; with 'steps' "
+               "the times are those of the simulated file as it is in the model's folder."})};
 }
 
 /// All rows of such a search: its own before those.

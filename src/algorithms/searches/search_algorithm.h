@@ -47,6 +47,8 @@ class SearchAlgorithm {
   virtual SearchStatus advance() = 0;
   virtual bool isTerminated() const = 0;
   virtual const SearchSummary& summary() const = 0;
+  /// Whether it ends when its best value changes too little, which negative values would do at once.
+  virtual bool comparesBestValues() const { return true; }
 };
 
 }  // namespace mirevo

@@ -177,7 +177,7 @@ bool rewardsTooLittle(const RunConfig& config, const ObjectiveFunction& objectiv
 
 /// What makes a search pointless.
 void warnOfSearch(const RunConfig& config, const SectionsRead& sections) {
-  if (config.aggregationMethod == AggregationMethod::zero) {
+  if (config.aggregationMethod == AggregationMethod::zero && config.task->judgesByAggregate()) {
     sections.judgement->warn("Aggregation_Method",
                              "makes every aggregate 0: the search cannot tell one set from another");
   }

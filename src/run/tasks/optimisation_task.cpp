@@ -412,7 +412,7 @@ void OptimisationTask::readStopping(const SetupSection& section, std::size_t var
   section.check(bound);
   requireRepeatedBudget(repetitions, stopping, section);
   warnOfOneLoop(section);
-  if (section.isWritten(kRangeKeyword) && !method->testsPopulationRange()) {
+  if (section.isWritten(kRangeKeyword) && (!method->testsPopulationRange() || method->facts().findsFront)) {
     section.warn(kRangeKeyword,
                  fmt::format("has no effect: {} does not test the range of a population", method->facts().longName));
   }
@@ -548,6 +548,7 @@ SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasib
 
 /// Begins the same search with a generator of its own and without a model.
 void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
+  if (method->facts().usesResiduals || usesSurrogate()) lapack();
   const bool drawsAnySet = !feasibility.isTested() && initialSample.generation != SampleGeneration::fromFile;
   const bool isSearch = surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
   if (drawsAnySet || !isSearch || !earlierSearches_.empty()) return;            // a search that is continued had begun
@@ -659,10 +660,12 @@ std::vector<std::string> OptimisationTask::linesOfCourse(const BestCourse& cours
 }
 
 std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext& context,
-                                                               const UnfinishedBatch& /*made*/) const {
+                                                               const UnfinishedBatch& made) const {
   if (repeated_) {
     TaskOutcome outcome{std::string(kEndOfTask)};
-    repeated_->addResults(context.space, outcome);
+    RepeatedSearch all = *repeated_;
+    all.takeUnfinished(context, made);
+    all.addResults(context.space, outcome);
     return outcome;
   }
   if (front_ && front_->hasFront()) {

@@ -31,6 +31,7 @@ class OptimisationTask final : public Task {
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
   std::optional<OneSlotOnly> needsOneSlot() const override;
+  bool judgesByAggregate() const override { return !method || !method->facts().findsFront; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   /// A search by residuals needs them in every result; one for a front shows those of the front.

@@ -1,5 +1,6 @@
 #include "run/tasks/repeated_search.h"
 
+#include <algorithm>
 #include <cmath>
 #include <deque>
 #include <limits>
@@ -139,13 +140,9 @@ class RepeatedSearch::Watch final : public Evaluator {
     all_.stretches_.back().last = all_.handedOut_;
   }
   void take(const ParameterSet& set, const EvaluationResult& result) {
+    all_.waiting_.erase(result.number);
     course().add(result.aggregate);
-    Repetition& own = repetition();
-    ++own.evaluations;
-    if (!result.ok() || (own.bestEvaluation > 0 && !(result.aggregate < own.aggregate))) return;
-    own.bestEvaluation = result.number;
-    own.aggregate = result.aggregate;
-    own.best = set;
+    all_.note(index_, set, result);
   }
 
   RepeatedSearch& all_;
@@ -156,6 +153,59 @@ class RepeatedSearch::Watch final : public Evaluator {
   std::vector<ParameterSet> sample_;    ///< evaluated before the aggregates are settled
   std::deque<ParameterSet> submitted_;  ///< without a result
 };
+
+/// Passes everything on to the evaluator of the run, and keeps results until their searches take them.
+class RepeatedSearch::Receipt final : public Evaluator {
+ public:
+  Receipt(RepeatedSearch& all, Evaluator& evaluator) : all_(all), evaluator_(evaluator) {}
+
+  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override {
+    return evaluator_.evaluateParameterSets(sets, mode);
+  }
+  void submit(std::span<const ParameterSet> sets) override {
+    submitted_.insert(submitted_.end(), sets.begin(), sets.end());
+    evaluator_.submit(sets);
+  }
+  EvaluationResult awaitFirst() override {
+    EvaluationResult result = evaluator_.awaitFirst();
+    all_.waiting_[result.number] = {std::move(submitted_.front()), result};
+    submitted_.pop_front();
+    return result;
+  }
+  UnfinishedBatch takeUnfinished() override { return evaluator_.takeUnfinished(); }
+  void settleAggregates(std::span<EvaluationResult> sample) override { evaluator_.settleAggregates(sample); }
+
+ private:
+  RepeatedSearch& all_;
+  Evaluator& evaluator_;
+  std::deque<ParameterSet> submitted_;  ///< without a result
+};
+
+void RepeatedSearch::note(std::size_t index, const ParameterSet& set, const EvaluationResult& result) {
+  Repetition& own = repetitions_[index];
+  ++own.evaluations;
+  if (!result.ok() || (own.bestEvaluation > 0 && !(result.aggregate < own.aggregate))) return;
+  own.bestEvaluation = result.number;
+  own.aggregate = result.aggregate;
+  own.best = set;
+}
+
+void RepeatedSearch::takeUnfinished(const TaskContext& context, const UnfinishedBatch& made) {
+  for (std::size_t i = 0; i < made.results.size(); ++i) {
+    waiting_[made.results[i].number] = {made.sets[i], made.results[i]};
+  }
+  for (auto& [number, evaluated] : waiting_) {
+    auto& [set, result] = evaluated;
+    const auto isIts = [number = number](const RepetitionStretch& one) {
+      return one.first <= number && number <= one.last;
+    };
+    const auto stretch = std::ranges::find_if(stretches_, isIts);
+    if (stretch == stretches_.end()) continue;
+    if (result.ok() && context.aggregate) result.aggregate = context.aggregate(result.objectiveValues);
+    note(static_cast<std::size_t>(stretch->repetition) - 1, set, result);
+  }
+  waiting_.clear();
+}
 
 SearchSummary RepeatedSearch::run(const TaskContext& context, const Search& search, const Ended& ended) {
   const auto count = static_cast<std::size_t>(settings_.count);
@@ -180,7 +230,8 @@ SearchSummary RepeatedSearch::run(const TaskContext& context, const Search& sear
     context.log.line("");
   };
   if (settings_.areSideBySide()) {
-    runSideBySide(context.evaluator, searches, report, oneEnded);
+    Receipt receipt(*this, context.evaluator);
+    runSideBySide(receipt, searches, report, oneEnded);
   } else {
     for (std::size_t i = 0; i < count; ++i) oneEnded(i, searches[i](context.evaluator, report));
   }

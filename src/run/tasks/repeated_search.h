@@ -1,7 +1,9 @@
 #pragma once
 
 #include <functional>
+#include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "algorithms/searches/best_course.h"
@@ -47,12 +49,17 @@ class RepeatedSearch final {
 
   /// Adds lines and tables about the repetitions as far as they have come.
   void addResults(const SearchSpace& space, TaskOutcome& outcome) const;
+  /// Of a run that ends early: counts the results that no search has taken, so that the repetitions are those of all
+  /// rows of the result file. `made` is what the evaluator handed over.
+  void takeUnfinished(const TaskContext& context, const UnfinishedBatch& made);
   /// Evaluations whose results they have.
   int evaluationCount() const;
 
  private:
   class Watch;
+  class Receipt;
 
+  void note(std::size_t index, const ParameterSet& set, const EvaluationResult& result);
   void end(std::size_t index, const SearchSummary& summary);
 
   RepetitionSettings settings_;
@@ -60,6 +67,8 @@ class RepeatedSearch final {
   std::vector<Repetition> repetitions_;  ///< those that have begun
   std::vector<RepetitionStretch> stretches_;
   int handedOut_ = 0;  ///< sets, of all repetitions
+  /// By number: results that have come and that their search, which waits for further ones, has not taken.
+  std::map<int, std::pair<ParameterSet, EvaluationResult>> waiting_;
   std::vector<BestCourse> courses_;
   SearchSummary best_;
 };

@@ -249,6 +249,10 @@ TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& ev
   return outcome;
 }
 
+void SensitivityTask::requireSets(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {
+  if (settings.calculatesCovariance) lapack();
+}
+
 std::vector<std::string> SensitivityTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
   const PerturbationPlan plan = planPerturbations(settings, space, space.initial, {}, feasibility);
   return infeasibleSets(feasibility, plan.sets, kWhatSets, static_cast<int>(plan.sets.size())).texts();

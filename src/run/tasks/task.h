@@ -200,6 +200,8 @@ class Task {
   virtual std::vector<std::string> setDoubts(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {
     return {};
   }
+  /// Whether sets are judged by their aggregate alone.
+  virtual bool judgesByAggregate() const { return true; }
   /// The result file of an earlier run whose evaluations it takes, TaskContext::earlierSample; empty: none.
   virtual std::string earlierResultFile() const { return {}; }
 
