@@ -110,8 +110,6 @@ std::vector<KeywordRow> paretoKeywordRows() {
           [](auto& m) -> auto& { return m.pareto.referencePoint; },
           {.name = kReferencePointKeyword,
            .defaultValue = kNoDefault,
-           .range = between(-1.0e100, 1.0e100),
-           .refusal = "Error: Reference point invalid",
            .meaning = "One value for each objective function: the point up to which the hypervolume counts. "
                       "Without it a tenth of the front's range behind the greatest value of each."}),
       choice<Method>(

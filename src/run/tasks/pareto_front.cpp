@@ -22,6 +22,7 @@ constexpr std::size_t kMostSeries = 100;
 /// Of the file of the series, which then has some 50 MB.
 constexpr std::size_t kMostSeriesRows = 1'000'000;
 constexpr int kMostStages = 200;
+constexpr double kFarthestReference = 1.0e100;
 
 /// A set in the table of the front.
 struct FrontRow {
@@ -124,10 +125,19 @@ void requireObjectives(const SetupSection& section, std::string_view keyword, co
                                search));
   }
   const std::vector<double>& reference = settings.referencePoint;
-  if (reference.empty() || reference.size() == objectives.size()) return;
-  control.refuse(fmt::format("Error: Reference point in {} algorithm invalid", search), kReferencePointKeyword,
-                 fmt::format("expected {} values, one for each objective function, found {}", objectives.size(),
-                             reference.size()));
+  if (reference.empty()) return;
+  const std::string refusal = fmt::format("Error: Reference point in {} algorithm invalid", search);
+  if (reference.size() != objectives.size()) {
+    control.refuse(refusal, kReferencePointKeyword,
+                   fmt::format("expected {} values, one for each objective function, found {}", objectives.size(),
+                               reference.size()));
+  }
+  for (const double value : reference) {
+    if (std::abs(value) <= kFarthestReference) continue;
+    control.refuse(refusal, kReferencePointKeyword,
+                   fmt::format("expected {:g} to {:g}, found {:g}: the hypervolume would be no number",
+                               -kFarthestReference, kFarthestReference, value));
+  }
 }
 
 const FrontMember* FrontFinding::suggested() const {
