@@ -89,7 +89,7 @@ ParameterSet Padds::drawCandidate(int evaluation) {
 ParameterSet Padds::drawOrigin() {
   const std::vector<FrontMember>& members = problem_.pareto->archive.members();
   while (!joined_.empty()) {
-    const ParameterSet next = std::move(joined_.front());
+    ParameterSet next = std::move(joined_.front());
     joined_.pop_front();
     const bool isLeft = std::ranges::any_of(members, [&next](const FrontMember& member) { return member.set == next; });
     if (isLeft) return next;
@@ -197,7 +197,8 @@ std::unique_ptr<SearchAlgorithm> PaddsMethod::make(SearchProblem problem) const 
 }
 
 SearchSummary PaddsMethod::run(SearchProblem problem, const PeriodicStep& /*periodicStep*/) const {
-  return SearchMethod::run(std::move(problem), {});
+  // The earlier searches are parts of this one, and not searches of their own as those of DDS.
+  return SearchMethod::run(std::move(problem), {});  // NOLINT(bugprone-parent-virtual-call)
 }
 
 }  // namespace mirevo

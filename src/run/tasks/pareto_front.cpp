@@ -90,7 +90,9 @@ std::vector<SeriesOfFront> seriesOfFront(const TaskContext& context) {
     std::string name = columnName(context.measures[observed.measure].name);
     if (std::ranges::find(names, name) != names.end()) name += fmt::format(" (measure {})", observed.measure + 1);
     names.push_back(name);
-    SeriesOfFront& series = all.emplace_back(std::move(name), begin, std::vector<std::string>{});
+    SeriesOfFront& series = all.emplace_back();
+    series.measure = std::move(name);
+    series.first = begin;
     const std::int64_t origin = secondNumber(observed.start);
     for (const double days : observed.days) series.times.push_back(isoTime(secondAfter(origin, days)));
   }
