@@ -10,6 +10,7 @@
 
 #include <fmt/core.h>
 
+#include "common/fatal_error.h"
 #include "common/progress_messages.h"
 
 namespace mirevo {
@@ -49,6 +50,14 @@ void EvaluationLedger::open(std::span<const ParameterSet> sets, DispatchMode mod
     runAgain_.insert(place);
     returned_.insert(place);
   }
+}
+
+void EvaluationLedger::requireClosed() const {
+  if (!isOpen()) return;
+  fatalError("Error: Evaluations left open by a search",
+             fmt::format("evaluation No. {} was not taken before a batch was begun. This is a fault of Mirevo: please "
+                         "report it with the setup",
+                         numberOf(closedCount_)));
 }
 
 void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {

@@ -84,6 +84,9 @@ class EvaluationLedger final {
   /// otherwise empty.
   std::vector<double> repeatedMeasures(std::size_t place) const;
   bool isOpen() const { return closedCount_ < endPlace(); }
+  /// To be called before a batch is opened. Throws FatalError if sets are open: their results would count as the
+  /// batch's.
+  void requireClosed() const;
   bool isComplete() const { return finishedCount_ == endPlace() - closedCount_ && runAgain_.empty(); }
   /// Closes a complete batch and returns one result per set, in order. Warns if no model run so far depends on the
   /// parameters.

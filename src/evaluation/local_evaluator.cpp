@@ -23,7 +23,7 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
 
 std::vector<EvaluationResult> LocalEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                     DispatchMode mode) {
-  assert(!ledger_.isOpen());
+  ledger_.requireClosed();
   ledger_.open(sets, mode, slots_.size());
   startInFreeSlots();
   while (!ledger_.isComplete()) goOn();

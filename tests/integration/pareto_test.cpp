@@ -171,6 +171,60 @@ TEST_F(Pareto, ResultsAreTheSameOnAnyNumberOfSlotsAfterAnInterruptionAndWithARai
   }
 }
 
+TEST_F(Pareto, ASearchThatItsHypervolumeHasEndedLeavesNothingOpenAndGoesOnWithARaisedBudget) {
+  const std::pair<const char*, const char*> cases[] = {
+      {"NSGA-II", "Population_Size = 12\nHypervolume_Evaluations = 24\nHypervolume_Change = 0.3"},
+      {"PADDS", "Candidates = 4\nHypervolume_Evaluations = 40\nHypervolume_Change = 0.1"}};
+  for (const auto& [search, keywords] : cases) {
+    SCOPED_TRACE(search);
+    folder_.useScript("true");
+    const auto evaluations = [&] {
+      const ReadTable course = readDataTable(folder_.read("basin_ParetoCourse.dat"));
+      return static_cast<int>(realCell(course.rows.back()[0]).value());
+    };
+    const auto rows = [&] {
+      std::vector<std::string> found;
+      const std::string text = folder_.read("basin_Optimisation.dat");
+      for (const std::string_view line : splitLines(text)) {
+        if (!line.empty() && line.front() >= '0' && line.front() <= '9') found.emplace_back(line);
+      }
+      return found;
+    };
+    const auto runAndCheck = [&] {
+      run();
+      EXPECT_THAT(log(), HasSubstr("Hypervolume convergence criterion met"));
+      EXPECT_THAT(log(), Not(HasSubstr("The final model run has other results")));
+      EXPECT_EQ(std::ssize(rows()), evaluations() + 1) << "one final run";
+    };
+    writeSetup({.search = search, .maxEvaluations = 400}, keywords);
+    runAndCheck();
+    const int ended = evaluations();
+    EXPECT_LT(ended, 200);
+    const std::string expected = results();
+    const std::vector<std::string> firstRows = rows();
+    removeResults();
+    folder_.useScript(kSleepByParameters);
+    writeSetup({.search = search, .maxEvaluations = 400, .slots = 3}, keywords);
+    runAndCheck();
+    EXPECT_EQ(results(), expected) << "three slots";
+    writeSetup({.search = search, .maxEvaluations = 400, .slots = 3, .restart = 1}, keywords);
+    runAndCheck();
+    EXPECT_EQ(results(), expected) << "a restart of a search that has ended";
+
+    writeSetup({.search = search, .maxEvaluations = 410, .slots = 3, .restart = 1}, keywords);
+    runAndCheck();
+    EXPECT_THAT(log(), HasSubstr(fmt::format("the first {} evaluations, which are kept; the hypervolume is tested anew",
+                                             ended)));
+    EXPECT_GT(evaluations(), ended + 24);
+    const std::vector<std::string> secondRows = rows();
+    EXPECT_TRUE(std::equal(firstRows.begin(), firstRows.begin() + ended, secondRows.begin()));
+    const std::string raised = results();
+    run();
+    EXPECT_EQ(results(), raised) << "a restart of a search that was continued";
+    removeResults();
+  }
+}
+
 TEST_F(Pareto, OneObjectiveFunctionAndAReferencePointThatDoesNotFitAreRefused) {
   writeSetup({.search = "NSGA-II"}, "", false);
   ProgramResult run = runProgram({setup_});

@@ -100,4 +100,19 @@ std::vector<std::size_t> spreadOver(std::span<const std::vector<double>> points,
   return kept;
 }
 
+void includeInSpread(std::vector<std::size_t>& indices, std::size_t wanted,
+                     std::span<const std::vector<double>> points) {
+  if (indices.empty() || std::ranges::find(indices, wanted) != indices.end()) return;
+  std::vector<std::vector<double>> chosen;
+  chosen.reserve(indices.size());
+  for (const std::size_t i : indices) chosen.push_back(points[i]);
+  const std::vector<double> distances = crowdingDistances(chosen);
+  std::size_t least = 0;
+  for (std::size_t i = 1; i < distances.size(); ++i) {
+    if (distances[i] <= distances[least]) least = i;
+  }
+  indices[least] = wanted;
+  std::ranges::sort(indices);
+}
+
 }  // namespace mirevo

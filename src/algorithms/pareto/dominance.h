@@ -29,8 +29,14 @@ std::vector<int> nondominationRanks(std::span<const ObjectivePoint> points);
 /// range counts nothing.
 std::vector<double> crowdingDistances(std::span<const std::vector<double>> points);
 
-/// The indices, ascending, of `count` of these points that are spread over all of them: from the whole the point with
-/// the least crowding distance is left out again and again, the later of equals.
+/// The indices, ascending, of `count` of these points that are spread over all of them: again and again those with the
+/// least crowding distances are left out, the later of equals; an eighth of what is still too many at a time, and one
+/// at a time where fewer than sixteen are.
 std::vector<std::size_t> spreadOver(std::span<const std::vector<double>> points, std::size_t count);
+
+/// Puts `wanted` among these indices, in their order, if it is missing: in place of the one with the least crowding
+/// distance among them, the later of equals, so that an end is given up only if there is nothing else.
+void includeInSpread(std::vector<std::size_t>& indices, std::size_t wanted,
+                     std::span<const std::vector<double>> points);
 
 }  // namespace mirevo

@@ -111,8 +111,8 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
       riseText(half, end), riseText(tenth, end), archive.entries().back().evaluation, count));
   if (!isBudgetUsed) {
     lines.emplace_back(
-        "A larger budget would not have changed this: the search had ended by itself. Other values of Random_Seed can "
-        "tell whether there is a better front");
+        "The search had ended by itself, before its budget was used up. A restart with a larger one takes it further; "
+        "other values of Random_Seed can tell whether there is a better front");
     return lines;
   }
   const double later = end - half;

@@ -266,6 +266,22 @@ std::vector<SearchAdvice> NsgaIiMethod::advice(std::size_t /*n*/) const {
   return {{kPopulationKeyword, settings.populationSize, kFewestMembers}};
 }
 
+RaisedBudget NsgaIiMethod::raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
+                                       const InitialSampleSettings& sample) const {
+  RaisedBudget raised = PopulationMethod::raiseBudget(history, stopping, sample);
+  if (!raised.refusal.empty() || pareto.hypervolumeEvaluations == 0) return raised;
+  // After an end by the hypervolume the last row is that of the final model run; otherwise one run is made again.
+  const int last = std::min(history.budget, history.lastRow - 1);
+  const int before = history.searches.empty() ? 0 : history.searches.back().lastEvaluation;
+  raised.keptEvaluations = std::max(last, before);
+  if (last <= before) return raised;
+  raised.earlier = EarlierSearch{history.budget, last};
+  raised.note = fmt::format(
+      "Max_No_Evaluations was raised from {} to {}: the search goes on with the first {} evaluations, which are kept{}",
+      history.budget, stopping.maxEvaluations, last, hypervolumeNote(pareto));
+  return raised;
+}
+
 std::unique_ptr<SearchAlgorithm> NsgaIiMethod::make(SearchProblem problem) const {
   return std::make_unique<NsgaIi>(settings, pareto, std::move(problem));
 }

@@ -75,6 +75,9 @@ class NsgaIiMethod final : public PopulationMethod {
   std::vector<SearchAdvice> advice(std::size_t n) const override;
   std::int64_t populationSize() const override { return settings.populationSize; }
   double evaluationsPerLoop() const override { return settings.populationSize; }
+  /// With the test of the hypervolume, this begins anew: a search that it has ended goes on.
+  RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
+                           const InitialSampleSettings& sample) const override;
   const ParetoSettings* paretoSettings() const override { return &pareto; }
   std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
 

@@ -55,6 +55,13 @@ SearchStatus Padds::advance() {
     underWay_.push_back(drawCandidate(madeCount() + 1));
     problem_.evaluator.submit({&underWay_.back(), 1});
   }
+  takeFirst();
+  checkEnd();
+  while (isTerminated() && !underWay_.empty()) takeFirst();
+  return kSearchOk;
+}
+
+void Padds::takeFirst() {
   const EvaluationResult result = problem_.evaluator.awaitFirst();
   const ParameterSet set = std::move(underWay_.front());
   underWay_.pop_front();
@@ -65,8 +72,6 @@ SearchStatus Padds::advance() {
     weights_.clear();
   }
   ++summary_.loopCount;
-  checkEnd();
-  return kSearchOk;
 }
 
 ParameterSet Padds::drawCandidate(int evaluation) {
@@ -84,7 +89,7 @@ ParameterSet Padds::drawCandidate(int evaluation) {
 ParameterSet Padds::drawOrigin() {
   const std::vector<FrontMember>& members = problem_.pareto->archive.members();
   while (!joined_.empty()) {
-    const ParameterSet next = std::move(joined_.front());
+    ParameterSet next = std::move(joined_.front());
     joined_.pop_front();
     const bool isLeft = std::ranges::any_of(members, [&next](const FrontMember& member) { return member.set == next; });
     if (isLeft) return next;
@@ -101,7 +106,9 @@ ParameterSet Padds::drawOrigin() {
 void Padds::drawWeights() {
   const std::vector<std::vector<double>> front = problem_.pareto->archive.front();
   const std::size_t objectives = front.front().size();
-  drawable_ = spreadOver(front, objectives > 2 ? kMostDrawn : front.size());
+  std::size_t most = objectives > 2 ? kMostDrawn : front.size();
+  if (settings_.selection == PaddsSelection::hypervolume) most = std::min(most, mostPointsOfHypervolume(objectives));
+  drawable_ = spreadOver(front, most);
   std::vector<std::vector<double>> values;
   const FrontScale scale(front);
   for (const std::size_t i : drawable_) values.push_back(scale.scaled(front[i]));
@@ -166,15 +173,20 @@ std::string_view PaddsMethod::budgetRefusal() const {
 
 RaisedBudget PaddsMethod::raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                                       const InitialSampleSettings& sample) const {
-  RaisedBudget raised = DdsMethod::raiseBudget(history, stopping, sample);
+  SearchHistory ofSearch = history;
+  // After an end by the hypervolume the last row is that of the final model run; otherwise one run is made again.
+  if (pareto.hypervolumeEvaluations > 0 && history.evaluations == history.lastRow) --ofSearch.evaluations;
+  RaisedBudget raised = DdsMethod::raiseBudget(ofSearch, stopping, sample);
   if (raised.earlier) {
     // What follows is the final model run, or candidates that were under way.
     raised.keptEvaluations = raised.earlier->lastEvaluation;
     raised.note = fmt::format(
         "Max_No_Evaluations was raised from {} to {}: as the probabilities of {} depend on it, they begin anew with "
-        "the "
-        "front of the first {} evaluations, which are kept",
-        history.budget, stopping.maxEvaluations, facts().longName, raised.earlier->lastEvaluation);
+        "the front of the first {} evaluations, which are kept{}",
+        history.budget, stopping.maxEvaluations, facts().longName, raised.earlier->lastEvaluation,
+        hypervolumeNote(pareto));
+  } else if (!history.searches.empty()) {
+    raised.keptEvaluations = history.searches.back().lastEvaluation;
   }
   return raised;
 }
@@ -185,7 +197,8 @@ std::unique_ptr<SearchAlgorithm> PaddsMethod::make(SearchProblem problem) const 
 }
 
 SearchSummary PaddsMethod::run(SearchProblem problem, const PeriodicStep& /*periodicStep*/) const {
-  return SearchMethod::run(std::move(problem), {});
+  // The earlier searches are parts of this one, and not searches of their own as those of DDS.
+  return SearchMethod::run(std::move(problem), {});  // NOLINT(bugprone-parent-virtual-call)
 }
 
 }  // namespace mirevo

@@ -30,8 +30,10 @@ struct PaddsSettings {
 ///
 /// What the paper leaves open: the hypervolume is that of the front scaled to 0 to 1, up to
 /// FrontScale::kUsualReference; by crowding the ends of the front weigh as much as the largest distance between them.
-/// With three or more objectives the set is drawn among kMostDrawn spread over the front, which bounds the time. What
-/// differs of the perturbation is said at Dds. A raised budget begins the decrease anew, with the front as it is.
+/// With three or more objectives the set is drawn among kMostDrawn spread over the front, by hypervolume at most
+/// mostPointsOfHypervolume(), which bounds the time with many objectives. Candidates that are under way at an end by
+/// the hypervolume belong to the search. What differs of the perturbation is said at Dds. A raised budget begins the
+/// decrease anew, with the front as it is.
 class Padds final : public ParetoSearch {
  public:
   Padds(const PaddsSettings& settings, const ParetoSettings& pareto, SearchProblem problem);
@@ -48,6 +50,7 @@ class Padds final : public ParetoSearch {
   ParameterSet drawCandidate(int evaluation);
   ParameterSet drawOrigin();
   void drawWeights();
+  void takeFirst();
   int madeCount() const { return summary_.evaluationCount + static_cast<int>(underWay_.size()); }
 
   PaddsSettings settings_;

@@ -69,21 +69,29 @@ bool ParetoSearch::hasHypervolumeSettled() {
   constexpr int kTestsOfWindow = 20;
   const int window = settings_.hypervolumeEvaluations;
   const int made = summary_.evaluationCount;
-  if (window == 0 || made < nextTest_ || made <= window || problem_.pareto->archive.members().empty()) return false;
+  const int before = problem_.earlierSearches.empty() ? 0 : problem_.earlierSearches.back().lastEvaluation;
+  if (window == 0 || made < nextTest_ || made - before <= window) return false;
+  if (problem_.pareto->archive.members().empty()) return false;
   nextTest_ = made + std::max(1, window / kTestsOfWindow);
   const ParetoArchive& archive = problem_.pareto->archive;
   FrontHistory history(archive.entries());
-  const auto& before = history.frontAfter(made - window);
-  if (before.empty()) return false;
+  const auto& front = history.frontAfter(made - window);
+  if (front.empty()) return false;
   const FrontScale scale(archive.front(), settings_.referencePoint);
   const double now = scale.hypervolumeShare(archive.front());
-  const double then = scale.hypervolumeShare(before);
+  const double then = scale.hypervolumeShare(front);
   if (!(now > 0.0) || now - then >= settings_.hypervolumeChange * now) return false;
   summary_.notes.push_back(
       fmt::format("In the last {} evaluations the hypervolume of the front has grown by {:.2g} % (Hypervolume_Change: "
                   "{:.2g} %)",
                   window, 100.0 * (now - then) / now, 100.0 * settings_.hypervolumeChange));
   return true;
+}
+
+std::string hypervolumeNote(const ParetoSettings& settings) {
+  if (settings.hypervolumeEvaluations == 0) return {};
+  return fmt::format("; the hypervolume is tested anew over the evaluations behind them (Hypervolume_Evaluations: {})",
+                     settings.hypervolumeEvaluations);
 }
 
 void ParetoSearch::checkEnd() {

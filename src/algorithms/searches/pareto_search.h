@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <optional>
 #include <span>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -68,7 +69,9 @@ class ParetoSearch : public SearchAlgorithm {
   std::vector<ParetoPoint> run(std::span<const ParameterSet> sets);
   /// Takes the next evaluation. `isOnFront` tells whether no earlier one covers it.
   ParetoPoint take(const ParameterSet& set, const EvaluationResult& result, bool* isOnFront = nullptr);
-  /// Ends the search if its budget is used up or its hypervolume has come to rest.
+  /// Ends the search if its budget is used up or its hypervolume has come to rest. The latter is tested over
+  /// evaluations behind the earlier searches alone: otherwise a search that ended by it would end there again with any
+  /// budget.
   void checkEnd();
   int budgetLeft() const { return problem_.stopping.maxEvaluations - summary_.evaluationCount; }
 
@@ -82,6 +85,9 @@ class ParetoSearch : public SearchAlgorithm {
   ParetoSettings settings_;
   int nextTest_ = 0;  ///< evaluations after which the hypervolume is looked at again
 };
+
+/// What a restart with a raised budget says of the test of the hypervolume, behind other text; empty without the test.
+std::string hypervolumeNote(const ParetoSettings& settings);
 
 /// The fixed texts with which a search for a front refuses values of its keywords.
 struct ParetoRefusals {

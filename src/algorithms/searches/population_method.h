@@ -24,7 +24,7 @@ class PopulationMethod : public SearchMethod {
   bool evaluatesSample(const InitialSampleSettings& sample) const final;
   /// With a raised budget the search continues as if the budget had been that large from the start.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
-                           const InitialSampleSettings& sample) const final;
+                           const InitialSampleSettings& sample) const override;
 };
 
 /// One whose population moves by simplexes.

@@ -66,7 +66,7 @@ struct RaisedBudget {
   std::string refusal;                                    ///< why it cannot be continued; empty when it can
   std::string note;                                       ///< what the log should say, one line; empty: nothing
   int keptEvaluations = std::numeric_limits<int>::max();  ///< evaluations with higher numbers are repeated
-  std::optional<EarlierSearch> earlier;                   ///< the earlier search, if this one starts from its best set
+  std::optional<EarlierSearch> earlier;                   ///< the earlier search, if another one begins behind it
 };
 
 /// A search together with its settings: everything that a setup, a run, a restart or a report asks about it. One class

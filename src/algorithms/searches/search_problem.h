@@ -17,7 +17,7 @@ class ProposalSelector;
 struct ResidualProblem;
 struct ParetoProblem;
 
-/// A search with a smaller budget, from whose best parameter set a search with a raised budget continues.
+/// A search with a smaller budget, from whose best parameter set, or front, a search with a raised budget continues.
 struct EarlierSearch {
   std::int32_t maxEvaluations = 0;  ///< its budget, counted from the first evaluation of the run
   std::int32_t lastEvaluation = 0;  ///< the number of its last evaluation

@@ -35,7 +35,7 @@ RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, WorkerWatch& watch, 
 
 std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                    DispatchMode mode) {
-  assert(!ledger_.isOpen());
+  ledger_.requireClosed();
   ledger_.open(sets, mode, workers_.size());
   startOnFreeWorkers();
   while (!ledger_.isComplete()) goOn();

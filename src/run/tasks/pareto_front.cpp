@@ -91,7 +91,9 @@ std::vector<SeriesOfFront> seriesOfFront(const TaskContext& context) {
     std::string name = columnName(context.measures[observed.measure].name);
     if (std::ranges::find(names, name) != names.end()) name += fmt::format(" (measure {})", observed.measure + 1);
     names.push_back(name);
-    SeriesOfFront& series = all.emplace_back(std::move(name), begin, std::vector<std::string>{});
+    SeriesOfFront& series = all.emplace_back();
+    series.measure = std::move(name);
+    series.first = begin;
     const std::int64_t origin = secondNumber(observed.start);
     for (const double days : observed.days) series.times.push_back(isoTime(secondAfter(origin, days)));
   }
@@ -107,6 +109,11 @@ void appendSeries(std::string& text, int number, const SeriesOfFront& series, st
       text += "NaN\n";
     }
   }
+}
+
+/// Three digits, and whole numbers in place of powers of ten: the best of many sets may be very near to 0.
+std::string percentText(double percent) {
+  return percent < 100.0 ? fmt::format("{:.3g} %", percent) : fmt::format("{:.0f} %", percent);
 }
 
 }  // namespace
@@ -211,10 +218,7 @@ void FrontFinding::addSeries(const TaskContext& context, TaskOutcome& outcome) c
   const std::size_t most = std::clamp<std::size_t>(kMostSeriesRows / rowCount, 1, kMostSeries);
   std::vector<std::size_t> members = spreadOver(front, most);
   const std::size_t nearest = *nearestToIdeal(problem_.archive.members());
-  if (std::ranges::find(members, nearest) == members.end()) {
-    members.back() = nearest;
-    std::ranges::sort(members);
-  }
+  includeInSpread(members, nearest, front);
   TaskFile file{runFilePath(context.filePrefix, run_files::kParetoSeries), {}};
   file.content = fmt::format("# Mirevo {}\n# Simulated series of {} of the {} sets of the front\n", programVersion(),
                              members.size(), front.size());
@@ -259,7 +263,8 @@ void FrontFinding::addFront(const TaskContext& context, int best, TaskOutcome& o
     const auto value = [i](const FrontMember& member) { return member.values[i]; };
     const double least = std::ranges::min_element(members, {}, value)->values[i];
     std::string more;
-    if (least > 0.0) more = fmt::format(", {:.3g} % above the least", 100.0 * (chosen.values[i] - least) / least);
+    if (least > 0.0)
+      more = fmt::format(", {} above the least", percentText(100.0 * (chosen.values[i] - least) / least));
     lines.push_back(fmt::format("   {} = {}{}", context.objectives[i].name, formatReal(chosen.values[i]), more));
   }
   if (best != 0) {

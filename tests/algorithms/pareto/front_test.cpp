@@ -2,6 +2,7 @@
 #include <cmath>
 #include <limits>
 #include <numbers>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -87,6 +88,23 @@ TEST(Dominance, CrowdingIsTheSumOfTheScaledDistancesBetweenNeighbours) {
   EXPECT_THAT(crowdingDistances(Points{{1.0, 2.0}}), ElementsAre(kInfinite));
   EXPECT_THAT(crowdingDistances(Points{{1.0, 2.0}, {1.0, 2.0}, {1.0, 2.0}}), ElementsAre(0.0, 0.0, 0.0));
   EXPECT_THAT(spreadOver(points, 3), ElementsAre(0, 1, 3));
+}
+
+TEST(Dominance, AWantedPointTakesThePlaceOfTheMostCrowdedOneAndOfNoEnd) {
+  // In the order in which they were found: the ends are the first and the last.
+  const Points points{{0.0, 10.0}, {1.0, 6.0}, {2.0, 5.0}, {3.0, 3.0}, {5.0, 0.0}};
+  using Indices = std::vector<std::size_t>;
+  const std::tuple<Indices, std::size_t, Indices> cases[] = {{{0, 1, 3, 4}, 2, {0, 2, 3, 4}},
+                                                             {{0, 2, 4}, 3, {0, 3, 4}},
+                                                             {{0, 2, 4}, 2, {0, 2, 4}},
+                                                             {{0, 4}, 2, {0, 2}},
+                                                             {{0}, 2, {2}},
+                                                             {Indices{}, 2, Indices{}}};
+  for (const auto& [given, wanted, expected] : cases) {
+    Indices indices = given;
+    includeInSpread(indices, wanted, points);
+    EXPECT_EQ(indices, expected);
+  }
 }
 
 TEST(Hypervolume, IsThatOfAllBoxesTogether) {

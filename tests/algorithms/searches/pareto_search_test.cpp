@@ -2,7 +2,9 @@
 #include <cmath>
 #include <limits>
 #include <tuple>
+#include <utility>
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -129,6 +131,35 @@ TEST(ParetoSearch, HypervolumeAtRestEndsTheSearch) {
   }
 }
 
+TEST(ParetoSearch, ASearchThatItsHypervolumeHasEndedTakesAllItHasSubmittedAndGoesOnWithARaisedBudget) {
+  for (const auto& [search, candidates] : {std::pair("NSGA-II", 1), {"PADDS", 1}, {"PADDS", 4}}) {
+    SCOPED_TRACE(fmt::format("{} {}", search, candidates));
+    FrontCase one{.search = search,
+                  .budget = 2000,
+                  .candidates = candidates,
+                  .pareto = {.hypervolumeEvaluations = 200, .hypervolumeChange = 0.2}};
+    const FoundFront first = findFront(one);
+    const int ended = first.summary.evaluationCount;
+    EXPECT_EQ(first.summary.terminationMessage, kHypervolumeSettledMessage);
+    EXPECT_EQ(std::ssize(first.sets), ended);
+    EXPECT_EQ(first.pareto.archive.evaluationCount(), ended);
+
+    one.earlier = {{2000, ended}};
+    one.budget = 2500;
+    const FoundFront second = findFront(one);
+    const int secondEnd = second.summary.evaluationCount;
+    EXPECT_GT(secondEnd, ended + 200);
+    EXPECT_LT(secondEnd, 2500);
+    EXPECT_TRUE(std::equal(first.sets.begin(), first.sets.end(), second.sets.begin()));
+
+    one.earlier.push_back({2500, secondEnd});
+    one.budget = 3000;
+    const FoundFront third = findFront(one);
+    EXPECT_GT(third.summary.evaluationCount, secondEnd + 200);
+    EXPECT_TRUE(std::equal(second.sets.begin(), second.sets.end(), third.sets.begin()));
+  }
+}
+
 TEST(ParetoSearch, FailedRunsAreNeverOnTheFrontAndDoNotStopIt) {
   for (const char* search : {"NSGA-II", "PADDS"}) {
     const auto fails = [](const ParameterSet& set) -> std::optional<EvaluationResult> {
@@ -196,6 +227,40 @@ TEST(Padds, ARaisedBudgetBeginsAnewWithTheFrontAndKeepsTheEvaluations) {
   };
   EXPECT_LT(changes(second, 180, 200), 2.5) << "towards the end of a budget one parameter or two";
   EXPECT_GT(changes(second, 202, 210), 8.0) << "at the beginning of the next most of them";
+}
+
+TEST(ParetoSearch, ARaisedBudgetKeepsWhatTheSearchHasMadeAndNoFinalModelRun) {
+  struct Case {
+    const char* what;
+    int evaluations;  // without a gap
+    int lastRow;
+    std::vector<EarlierSearch> searches;
+    int lastOfNsgaIi;  // 0: it begins no search behind the earlier ones
+    int lastOfPadds;
+  };
+  const Case cases[] = {{"ended by its hypervolume", 119, 119, {}, 118, 118},
+                        {"the same, a row is missing", 50, 119, {}, 118, 50},
+                        {"ended by its budget", 401, 401, {}, 400, 400},
+                        {"nothing but the final run follows an earlier search", 119, 119, {{300, 118}}, 0, 0},
+                        {"ended twice by its hypervolume", 181, 181, {{300, 118}}, 180, 180}};
+  NsgaIiMethod nsgaIi;
+  PaddsMethod padds;
+  nsgaIi.pareto.hypervolumeEvaluations = padds.pareto.hypervolumeEvaluations = 60;
+  for (const Case& one : cases) {
+    const SearchHistory history{400, one.evaluations, one.searches, 1, one.lastRow};
+    for (const SearchMethod* method :
+         {static_cast<const SearchMethod*>(&nsgaIi), static_cast<const SearchMethod*>(&padds)}) {
+      SCOPED_TRACE(fmt::format("{} {}", method->facts().name.name, one.what));
+      const int last = method == &padds ? one.lastOfPadds : one.lastOfNsgaIi;
+      const RaisedBudget raised = method->raiseBudget(history, {500}, {});
+      EXPECT_EQ(raised.earlier.has_value(), last > 0);
+      EXPECT_EQ(raised.keptEvaluations, last > 0 ? last : one.searches.back().lastEvaluation);
+      if (last == 0) continue;
+      EXPECT_EQ(raised.earlier->lastEvaluation, last);
+      EXPECT_EQ(raised.earlier->maxEvaluations, 400);
+      EXPECT_THAT(raised.note, HasSubstr(fmt::format("the first {} evaluations, which are kept", last)));
+    }
+  }
 }
 
 TEST(Padds, EachWayToDrawFromTheFrontIsAnotherSearch) {
