@@ -68,9 +68,9 @@ std::vector<std::vector<double>> normalDeviates(std::span<const std::vector<doub
   std::vector<std::vector<double>> deviates(chains.begin(), chains.end());
   for (std::vector<double>& chain : deviates) {
     for (double& value : chain) {
-      const auto equal = std::ranges::equal_range(sorted, value);
-      const auto before = static_cast<double>(equal.begin() - sorted.begin());
-      const double rank = before + 0.5 * (1.0 + static_cast<double>(equal.size()));
+      const auto [first, last] = std::equal_range(sorted.begin(), sorted.end(), value);
+      const auto before = static_cast<double>(first - sorted.begin());
+      const double rank = before + 0.5 * (1.0 + static_cast<double>(last - first));
       int fault = 0;
       value = normalQuantile((rank - 0.375) / count, fault);
     }
