@@ -1,6 +1,7 @@
 #include "report/report_sample.h"
 
 #include <algorithm>
+#include <filesystem>
 #include <limits>
 
 #include <fmt/format.h>
