@@ -95,8 +95,9 @@ double sharedVolume(std::span<const double> point, std::span<const std::vector<d
   Points limited;
   limited.reserve(others.size());
   for (const std::vector<double>& other : others) {
-    std::vector<double>& worse = limited.emplace_back(other);
+    std::vector<double> worse = other;
     for (std::size_t i = 0; i < worse.size(); ++i) worse[i] = std::max(worse[i], point[i]);
+    limited.push_back(std::move(worse));
   }
   return volumeOf(std::move(limited), reference);
 }

@@ -156,7 +156,8 @@ std::vector<std::string> repetitionLines(std::span<const Repetition> repetitions
     if (!repetition.termination.empty() && repetition.bestEvaluation > 0) ended.push_back(&repetition);
   }
   if (ended.size() < 2) return lines;
-  for (std::string& line : SpreadText(std::move(ended), space).lines()) lines.push_back(std::move(line));
+  const std::vector<std::string> spread = SpreadText(std::move(ended), space).lines();
+  lines.insert(lines.end(), spread.begin(), spread.end());
   return lines;
 }
 
