@@ -12,6 +12,8 @@
 
 namespace mirevo {
 
+inline constexpr std::string_view kAlgorithmTypeKeyword = "Algorithm_Type";
+
 /// Any other number: no search is run.
 enum class SurrogateUse : std::int32_t { no = 0, yes = 1 };
 
