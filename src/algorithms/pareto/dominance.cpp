@@ -5,6 +5,58 @@
 #include <numeric>
 
 namespace mirevo {
+namespace {
+
+/// Points in the order of each objective, from which ever more of them are left out: they are sorted but once.
+class CrowdedPoints final {
+ public:
+  explicit CrowdedPoints(const PointTable& points)
+      : orders_(points.width()), distances_(points.size()), isLeftOut_(points.size()) {
+    for (std::size_t j = 0; j < orders_.size(); ++j) {
+      orders_[j].resize(points.size());
+      for (std::size_t i = 0; i < points.size(); ++i) orders_[j][i] = {points[i][j], i};
+      std::ranges::stable_sort(orders_[j], {}, &Place::value);
+    }
+  }
+
+  /// By the index of the point, of those that are left.
+  const std::vector<double>& distances() {
+    constexpr double kInfinite = std::numeric_limits<double>::infinity();
+    std::ranges::fill(distances_, 0.0);
+    for (const std::vector<Place>& order : orders_) {
+      // A point that equals all others is alone at every end.
+      if (order.size() == 1) distances_[order.front().point] = kInfinite;
+      const double range = order.back().value - order.front().value;
+      if (!(range > 0.0)) continue;
+      distances_[order.front().point] = kInfinite;
+      distances_[std::ranges::lower_bound(order, order.back().value, {}, &Place::value)->point] = kInfinite;
+      for (std::size_t i = 1; i + 1 < order.size(); ++i) {
+        distances_[order[i].point] += (order[i + 1].value - order[i - 1].value) / range;
+      }
+    }
+    return distances_;
+  }
+
+  void leaveOut(std::span<const std::size_t> points) {
+    for (const std::size_t i : points) isLeftOut_[i] = 1;
+    for (std::vector<Place>& order : orders_) {
+      std::erase_if(order, [this](const Place& place) { return isLeftOut(place.point); });
+    }
+  }
+  bool isLeftOut(std::size_t point) const { return isLeftOut_[point] != 0; }
+
+ private:
+  struct Place {
+    double value = 0.0;
+    std::size_t point = 0;
+  };
+
+  std::vector<std::vector<Place>> orders_;  ///< one for each objective; equal values by the index of their points
+  std::vector<double> distances_;
+  std::vector<char> isLeftOut_;
+};
+
+}  // namespace
 
 bool dominates(std::span<const double> a, std::span<const double> b) {
   bool isLess = false;
@@ -53,49 +105,28 @@ std::vector<int> nondominationRanks(std::span<const ObjectivePoint> points) {
   return ranks;
 }
 
-std::vector<double> crowdingDistances(std::span<const std::vector<double>> points) {
-  std::vector<double> distances(points.size(), 0.0);
-  if (points.empty()) return distances;
-  std::vector<std::size_t> order(points.size());
-  for (std::size_t j = 0; j < points.front().size(); ++j) {
-    std::iota(order.begin(), order.end(), std::size_t{0});
-    std::stable_sort(order.begin(), order.end(),
-                     [points, j](std::size_t a, std::size_t b) { return points[a][j] < points[b][j]; });
-    const double range = points[order.back()][j] - points[order.front()][j];
-    if (!(range > 0.0)) continue;
-    distances[order.front()] = std::numeric_limits<double>::infinity();
-    distances[*std::ranges::find_if(order, [&](std::size_t i) { return points[i][j] == points[order.back()][j]; })] =
-        std::numeric_limits<double>::infinity();
-    for (std::size_t i = 1; i + 1 < order.size(); ++i) {
-      distances[order[i]] += (points[order[i + 1]][j] - points[order[i - 1]][j]) / range;
-    }
-  }
-  // A point that equals all others is alone at every end.
-  if (points.size() == 1) distances.front() = std::numeric_limits<double>::infinity();
-  return distances;
+std::vector<double> crowdingDistances(const PointTable& points) {
+  return CrowdedPoints(points).distances();
 }
 
-std::vector<std::size_t> spreadOver(std::span<const std::vector<double>> points, std::size_t count) {
+std::vector<std::size_t> spreadOver(const PointTable& points, std::size_t count) {
   std::vector<std::size_t> kept(points.size());
   std::iota(kept.begin(), kept.end(), std::size_t{0});
+  if (kept.size() <= count) return kept;
+  CrowdedPoints crowded(points);
+  std::vector<std::size_t> order;
   while (kept.size() > count) {
     // Far more than are wanted: a share at a time, as the distances cost as much for one as for many.
     const std::size_t excess = kept.size() - count;
     const std::size_t most = std::max<std::size_t>(1, excess / 8);
-    std::vector<std::vector<double>> left;
-    left.reserve(kept.size());
-    for (const std::size_t i : kept) left.push_back(points[i]);
-    const std::vector<double> distances = crowdingDistances(left);
-    std::vector<std::size_t> order(kept.size());
-    std::iota(order.begin(), order.end(), std::size_t{0});
-    std::stable_sort(order.begin(), order.end(),
-                     [&](std::size_t a, std::size_t b) { return distances[a] > distances[b]; });
-    order.resize(kept.size() - most);
-    std::ranges::sort(order);
-    std::vector<std::size_t> next;
-    next.reserve(order.size());
-    for (const std::size_t place : order) next.push_back(kept[place]);
-    kept = std::move(next);
+    const std::vector<double>& distances = crowded.distances();
+    order = kept;
+    const auto first = order.end() - static_cast<std::ptrdiff_t>(most);
+    std::nth_element(order.begin(), first, order.end(), [&distances](std::size_t a, std::size_t b) {
+      return distances[a] > distances[b] || (distances[a] == distances[b] && a < b);
+    });
+    crowded.leaveOut({first, order.end()});
+    std::erase_if(kept, [&crowded](std::size_t i) { return crowded.isLeftOut(i); });
   }
   return kept;
 }
