@@ -16,13 +16,14 @@ class PointTable final {
     for (const std::vector<double>& point : points) add(point);
   }
 
-  std::size_t size() const { return width_ == 0 ? 0 : values_.size() / width_; }
+  std::size_t size() const { return size_; }
   /// Values of a point.
   std::size_t width() const { return width_; }
   std::span<const double> operator[](std::size_t i) const { return {values_.data() + i * width_, width_}; }
 
   /// All points have the same number of values.
   void add(std::span<const double> point) {
+    ++size_;
     width_ = point.size();
     values_.insert(values_.end(), point.begin(), point.end());
   }
@@ -34,10 +35,12 @@ class PointTable final {
       for (std::size_t j = 0; j < width_; ++j) values_[to * width_ + j] = values_[i * width_ + j];
       ++to;
     }
+    size_ = to;
     values_.resize(to * width_);
   }
 
  private:
+  std::size_t size_ = 0;
   std::size_t width_ = 0;
   std::vector<double> values_;
 };

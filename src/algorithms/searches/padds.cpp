@@ -147,15 +147,10 @@ BoundSection PaddsMethod::section() {
                              .range = kFraction,
                              .refusal = "Error: Perturbation parameter in PADDS algorithm invalid",
                              .meaning = std::string(kPerturbationMeaning)}),
-            choice<Method>(
-                [](Method& m, const SetupValue& value) {
-                  for (std::size_t i = 0; i < std::size(kPaddsSelectionNames); ++i) {
-                    if (isCode(kPaddsSelectionNames[i], value)) m.selection = static_cast<PaddsSelection>(i);
-                  }
-                },
+            namedChoice<Method, kPaddsSelectionNames>(
+                [](auto& m) -> auto& { return m.selection; },
                 {.name = "Selection",
                  .defaultValue = "'hypervolume'",
-                 .codes = kPaddsSelectionNames,
                  .meaning = "By what the set of the front that is perturbed is drawn: what it contributes to the "
                             "hypervolume, its crowding distance, or all alike."}),
             setting<Method>([](auto& m) -> auto& { return m.settings.candidates; },
