@@ -206,7 +206,7 @@ std::vector<double> hypervolumeContributions(const PointTable& points, std::span
 }
 
 std::size_t mostPointsOfHypervolume(std::size_t objectives) {
-  constexpr std::size_t kMost[] = {100'000, 100'000, 100'000, 2000, 300, 100, 60, 40};
+  constexpr std::size_t kMost[] = {100'000, 100'000, 100'000, 20'000, 300, 100, 60, 40};
   return objectives < std::size(kMost) ? kMost[objectives] : 25;
 }
 
