@@ -2,9 +2,9 @@
 
 #include <algorithm>
 #include <array>
-#include <compare>
 #include <iterator>
 #include <limits>
+#include <tuple>
 
 namespace mirevo {
 namespace {
@@ -145,14 +145,13 @@ std::vector<double> areaContributions(const PointTable& points, std::span<const 
     double x = 0.0;
     double y = 0.0;
     std::size_t point = 0;
-    auto operator<=>(const Place&) const = default;
   };
   std::vector<Place> order;
   order.reserve(points.size());
   for (std::size_t i = 0; i < points.size(); ++i) {
     if (points[i][0] < reference[0] && points[i][1] < reference[1]) order.push_back({points[i][0], points[i][1], i});
   }
-  std::ranges::sort(order);
+  std::ranges::sort(order, {}, [](const Place& place) { return std::tuple(place.x, place.y, place.point); });
   std::vector<Place> stairs;
   std::vector<bool> isAlone(points.size(), true);
   for (const Place& place : order) {

@@ -2,6 +2,7 @@
 #include <cmath>
 #include <limits>
 #include <numbers>
+#include <numeric>
 #include <tuple>
 
 #include <gmock/gmock.h>
@@ -88,6 +89,32 @@ TEST(Dominance, CrowdingIsTheSumOfTheScaledDistancesBetweenNeighbours) {
   EXPECT_THAT(crowdingDistances(Points{{1.0, 2.0}}), ElementsAre(kInfinite));
   EXPECT_THAT(crowdingDistances(Points{{1.0, 2.0}, {1.0, 2.0}, {1.0, 2.0}}), ElementsAre(0.0, 0.0, 0.0));
   EXPECT_THAT(spreadOver(points, 3), ElementsAre(0, 1, 3));
+}
+
+// Sorted anew for each share that is left out, many points being equal in some objectives.
+TEST(Dominance, WhatIsSpreadOverPointsIsLeftWhenTheMostCrowdedAreTakenAway) {
+  for (const std::size_t objectives : {2U, 3U, 4U}) {
+    const Points points = gridPoints(300, objectives, 40, 7);
+    std::vector<std::size_t> expected(points.size());
+    std::iota(expected.begin(), expected.end(), std::size_t{0});
+    while (expected.size() > 25) {
+      Points left;
+      for (const std::size_t i : expected) left.push_back(points[i]);
+      const std::vector<double> distances = crowdingDistances(left);
+      for (std::size_t j = 0; j < objectives; ++j) {
+        const auto least = std::ranges::min_element(left, {}, [j](const auto& point) { return point[j]; });
+        EXPECT_EQ(distances[static_cast<std::size_t>(least - left.begin())], kInfinite) << "an end";
+      }
+      std::vector<std::size_t> places(left.size());
+      std::iota(places.begin(), places.end(), std::size_t{0});
+      std::ranges::stable_sort(places, std::ranges::greater{}, [&](std::size_t i) { return distances[i]; });
+      places.resize(left.size() - std::max<std::size_t>(1, (left.size() - 25) / 8));
+      std::ranges::sort(places);
+      for (std::size_t& place : places) place = expected[place];
+      expected = places;
+    }
+    EXPECT_EQ(spreadOver(points, 25), expected) << objectives << " objectives";
+  }
 }
 
 TEST(Dominance, AWantedPointTakesThePlaceOfTheMostCrowdedOneAndOfNoEnd) {
