@@ -73,34 +73,38 @@ bool isConstraintDominated(const ObjectivePoint& point, const ObjectivePoint& by
 }
 
 std::vector<int> nondominationRanks(std::span<const ObjectivePoint> points) {
-  const std::size_t n = points.size();
-  std::vector<std::vector<std::size_t>> dominated(n);  // by each point
-  std::vector<int> dominators(n, 0);                   // that have no rank yet
-  for (std::size_t i = 0; i < n; ++i) {
-    for (std::size_t k = i + 1; k < n; ++k) {
-      if (isConstraintDominated(points[k], points[i])) {
-        dominated[i].push_back(k);
-        ++dominators[k];
-      } else if (isConstraintDominated(points[i], points[k])) {
-        dominated[k].push_back(i);
-        ++dominators[i];
+  // What dominates a point comes before it.
+  std::vector<std::size_t> order(points.size());
+  std::iota(order.begin(), order.end(), std::size_t{0});
+  std::ranges::stable_sort(order, [points](std::size_t a, std::size_t b) {
+    if (points[a].violation != points[b].violation) return points[a].violation < points[b].violation;
+    return points[a].violation == 0.0 && points[a].values < points[b].values;
+  });
+  std::vector<int> ranks(points.size(), 0);
+  std::vector<PointTable> fronts;
+  std::size_t place = 0;
+  for (; place < order.size() && points[order[place]].violation == 0.0; ++place) {
+    const std::vector<double>& values = points[order[place]].values;
+    // A point that dominates this one is dominated itself by one of each front before its own.
+    const auto front = std::ranges::partition_point(fronts, [&values](const PointTable& members) {
+      for (std::size_t i = members.size(); i > 0; --i) {
+        if (dominates(members[i - 1], values)) return true;
       }
+      return false;
+    });
+    ranks[order[place]] = static_cast<int>(front - fronts.begin()) + 1;
+    if (front == fronts.end()) {
+      fronts.emplace_back().add(values);
+    } else {
+      front->add(values);
     }
   }
-  std::vector<int> ranks(n, 0);
-  std::vector<std::size_t> front;
-  for (std::size_t i = 0; i < n; ++i) {
-    if (dominators[i] == 0) front.push_back(i);
-  }
-  for (int rank = 1; !front.empty(); ++rank) {
-    std::vector<std::size_t> next;
-    for (const std::size_t i : front) {
-      ranks[i] = rank;
-      for (const std::size_t k : dominated[i]) {
-        if (--dominators[k] == 0) next.push_back(k);
-      }
-    }
-    front = std::move(next);
+  auto rank = static_cast<int>(fronts.size());
+  double violation = 0.0;
+  for (; place < order.size(); ++place) {
+    if (points[order[place]].violation != violation) ++rank;
+    violation = points[order[place]].violation;
+    ranks[order[place]] = rank;
   }
   return ranks;
 }

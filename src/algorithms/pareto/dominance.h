@@ -21,8 +21,9 @@ bool dominates(std::span<const double> a, std::span<const double> b);
 /// violation is better, and of two points without any the one that dominates the other.
 bool isConstraintDominated(const ObjectivePoint& point, const ObjectivePoint& by);
 
-/// The fast non-dominated sort of the same paper: of each point its rank, 1 for those that no other dominates, 2 for
-/// those that only points of rank 1 dominate, and so on.
+/// The non-dominated sort of the same paper: of each point its rank, 1 for those that no other dominates, 2 for those
+/// that only points of rank 1 dominate, and so on. Found one after the other, in the order of their first objective,
+/// with as much memory as the points have: Zhang, Tian, Cheng and Jin (2015), doi:10.1109/TEVC.2014.2308305.
 std::vector<int> nondominationRanks(std::span<const ObjectivePoint> points);
 
 /// The crowding distance of the same paper, of points of one rank: the sum over the objectives of the distance between
