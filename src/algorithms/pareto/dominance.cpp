@@ -127,7 +127,7 @@ std::vector<std::size_t> spreadOver(const PointTable& points, std::size_t count)
     order = kept;
     const auto first = order.end() - static_cast<std::ptrdiff_t>(most);
     std::nth_element(order.begin(), first, order.end(), [&distances](std::size_t a, std::size_t b) {
-      return distances[a] > distances[b] || (distances[a] == distances[b] && a < b);
+      return distances[a] != distances[b] ? distances[a] > distances[b] : a < b;
     });
     crowded.leaveOut({first, order.end()});
     std::erase_if(kept, [&crowded](std::size_t i) { return crowded.isLeftOut(i); });

@@ -5,6 +5,7 @@
 #include <iterator>
 #include <limits>
 #include <tuple>
+#include <utility>
 
 namespace mirevo {
 namespace {
@@ -108,8 +109,9 @@ double sharedVolume(std::span<const double> point, std::span<const std::vector<d
   Points limited;
   limited.reserve(others.size());
   for (const std::vector<double>& other : others) {
-    std::vector<double>& worse = limited.emplace_back(reference.size());
+    std::vector<double> worse(reference.size());
     for (std::size_t i = 0; i < worse.size(); ++i) worse[i] = std::max(other[i], point[i]);
+    limited.push_back(std::move(worse));
   }
   return volumeOf(std::move(limited), reference);
 }

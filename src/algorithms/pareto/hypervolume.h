@@ -19,7 +19,7 @@ double hypervolume(std::span<const std::vector<double>> points, std::span<const 
 /// equal others have 0.
 std::vector<double> hypervolumeContributions(const PointTable& points, std::span<const double> reference);
 
-/// Of more points the hypervolume takes long: minutes for a hundred fronts.
+/// Of more points the hypervolume would take long, as it is that of hundreds of fronts.
 std::size_t mostPointsOfHypervolume(std::size_t objectives);
 
 }  // namespace mirevo
