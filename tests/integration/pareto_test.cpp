@@ -1,12 +1,14 @@
 #include <algorithm>
 #include <cmath>
 #include <map>
+#include <set>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "common/data_table.h"
 #include "integration/model_folder.h"
+#include "integration/mpi_job.h"
 #include "matchers.h"
 
 namespace mirevo::testing {
@@ -17,10 +19,12 @@ namespace {
 /// set on it add up to the distance of the two series.
 class Pareto : public ::testing::Test {
  protected:
-  Pareto() {
-    folder_.write("model/parameters.txt", "a = 7\nb = 1\nc = 1\n");
+  Pareto() { makeObservations("other.csv", 7, 1); }
+
+  void makeObservations(const std::string& file, double a, double b) {
+    folder_.write("model/parameters.txt", fmt::format("a = {}\nb = {}\nc = 1\n", a, b));
     const std::string command =
-        fmt::format("cd '{}/model' && ./run.sh && cp simulated.csv ../other.csv", folder_.path());
+        fmt::format("cd '{}/model' && ./run.sh && cp simulated.csv '../{}'", folder_.path(), file);
     EXPECT_EQ(std::system(command.c_str()), 0);
   }
 
@@ -42,6 +46,30 @@ class Pareto : public ::testing::Test {
     folder_.editSetup("[OBJECTIVE_FUNCTIONS]\n      TqSEKdxListItemCount = 1",
                       "[OBJECTIVE_FUNCTIONS]\n      TqSEKdxListItemCount = 2\n      [OBJECTIVE_2]\n"
                       "        Name = 'other'\n        Function_Type = 0\n        Weight = 1.0\n      [/OBJECTIVE_2]");
+  }
+  /// A third series of observations, made with a = 3 and b = 4, and its objective function.
+  void addThird() {
+    makeObservations("third.csv", 3, 4);
+    std::string text = folder_.read("basin.kdx");
+    const auto begin = text.find("[MEASURE_2]");
+    const std::string end = "[/MEASURE_2]\n";
+    std::string third = text.substr(begin, text.find(end) + end.size() - begin);
+    for (const auto& [from, to] : {std::pair("[MEASURE_2]", "[MEASURE_3]"),
+                                   {"[/MEASURE_2]", "[/MEASURE_3]"},
+                                   {"'flow of another'", "'a third'"},
+                                   {"'other'", "'third'"},
+                                   {"other.csv", "third.csv"}}) {
+      const auto at = third.find(from);
+      ASSERT_NE(at, std::string::npos) << from;
+      third.replace(at, std::string_view(from).size(), to);
+    }
+    text.insert(text.find(end) + end.size(), third);
+    folder_.write("basin.kdx", text);
+    folder_.editSetup("[OUTPUT_MEASURES]\n      TqSEKdxListItemCount = 2",
+                      "[OUTPUT_MEASURES]\n      TqSEKdxListItemCount = 3");
+    folder_.editSetup("[OBJECTIVE_FUNCTIONS]\n      TqSEKdxListItemCount = 2\n",
+                      "[OBJECTIVE_FUNCTIONS]\n      TqSEKdxListItemCount = 3\n      [OBJECTIVE_3]\n"
+                      "        Name = 'third'\n        Function_Type = 0\n      [/OBJECTIVE_3]\n");
   }
   void run() {
     const ProgramResult result = runProgram({setup_});
@@ -69,6 +97,32 @@ class Pareto : public ::testing::Test {
 
 double numberInRow(const ReadTable& table, const std::vector<std::string>& row, const std::string& column) {
   return realCell(row.at(table.column(column).value())).value();
+}
+
+/// The numbers of the evaluations of rank 1, ascending.
+std::set<std::string> numbersOnFront(const ReadTable& front) {
+  std::set<std::string> numbers;
+  for (const auto& row : front.rows) {
+    if (numberInRow(front, row, "Rank") == 1.0) numbers.insert(row[0]);
+  }
+  return numbers;
+}
+
+/// Those of the rows of the result file that no other one dominates, by comparing each with each.
+std::set<std::string> numbersByComparison(const ReadTable& results, const std::vector<std::string>& objectives) {
+  const auto isAtMost = [&](const auto& a, const auto& b) {
+    return std::ranges::all_of(objectives, [&](const std::string& name) {
+      return numberInRow(results, a, name) <= numberInRow(results, b, name);
+    });
+  };
+  std::set<std::string> numbers;
+  for (auto row = results.rows.begin(); row != results.rows.end(); ++row) {
+    const bool isBehind = std::any_of(results.rows.begin(), results.rows.end(), [&](const auto& other) {
+      return &other != &*row && isAtMost(other, *row) && (&other < &*row || !isAtMost(*row, other));
+    });
+    if ((*row)[1] == "OK" && !isBehind) numbers.insert((*row)[0]);
+  }
+  return numbers;
 }
 
 TEST_F(Pareto, TheFrontIsTheLineBetweenTheTwoSetsAndItsSeriesAreThoseOfItsSets) {
@@ -221,6 +275,120 @@ TEST_F(Pareto, ASearchThatItsHypervolumeHasEndedLeavesNothingOpenAndGoesOnWithAR
     const std::string raised = results();
     run();
     EXPECT_EQ(results(), raised) << "a restart of a search that was continued";
+    removeResults();
+  }
+}
+
+TEST_F(Pareto, EveryRowMeetsScalesAndConstraintsAndTheFrontIsWhatNoRowDominates) {
+  for (const auto& [search, keywords] : {std::pair("NSGA-II", "Population_Size = 20"), {"PADDS", "Candidates = 2"}}) {
+    SCOPED_TRACE(search);
+    writeSetup({.search = search, .includesInitial = false, .maxEvaluations = 100, .slots = 2}, keywords);
+    folder_.editSetup("Upper_Bound = 10.0\n      Transformation_Type = 0",
+                      "Upper_Bound = 10.0\n      Transformation_Type = 2");
+    folder_.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 5.0\n      Transformation_Type = 0",
+                      "Lower_Bound = 0.01\n      Upper_Bound = 5.0\n      Transformation_Type = 1");
+    // For both sets with which the observations are made it is 9.
+    folder_.editSetup("TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+                      "TqSEKdxListItemCount = 1\n[CONSTRAINT_1]\nLeft_Equation = 'a + 2 * b'\nRight_Equation = '8.5'\n"
+                      "Logical_Operator = 1\n[/CONSTRAINT_1]\n[/INTERNAL_CONSTRAINTS]");
+    run();
+    const ReadTable rows = readDataTable(folder_.read("basin_Optimisation.dat"));
+    std::set<double> whole;
+    int small = 0;
+    for (const auto& row : rows.rows) {
+      EXPECT_EQ(row[1], "OK") << row[0];
+      const double a = numberInRow(rows, row, "a");
+      const double b = numberInRow(rows, row, "b");
+      EXPECT_EQ(a, std::round(a)) << row[0];
+      EXPECT_LE(a + 2.0 * b, 8.5) << row[0];
+      EXPECT_TRUE(a >= 0.0 && a <= 10.0 && b >= 0.01 && b <= 5.0) << row[0];
+      whole.insert(a);
+      if (b < 0.1) ++small;
+    }
+    EXPECT_GE(whole.size(), 3U);
+    EXPECT_GE(small, 3) << "a tenth of the values has a good third of a logarithmic scale";
+    EXPECT_EQ(numbersOnFront(front()), numbersByComparison(rows, {"fit", "other"}));
+    removeResults();
+  }
+}
+
+TEST_F(Pareto, ThreeObjectivesHaveTheFrontThatNoRowDominates) {
+  for (const auto& [search, keywords] : {std::pair("NSGA-II", "Population_Size = 20"), {"PADDS", "Candidates = 2"}}) {
+    SCOPED_TRACE(search);
+    writeSetup({.search = search, .maxEvaluations = 160, .slots = 2, .modelArguments = "--fail-above 9"}, keywords);
+    addThird();
+    run();
+    const ReadTable table = front();
+    EXPECT_THAT(table.columns, ::testing::ElementsAre("Evaluation", "Rank", "Crowding", "Violation", "Suggested",
+                                                      "Distance", "fit", "other", "third", "a", "b"));
+    const std::set<std::string> numbers = numbersOnFront(table);
+    EXPECT_GT(numbers.size(), 20U);
+    EXPECT_EQ(numbers,
+              numbersByComparison(readDataTable(folder_.read("basin_Optimisation.dat")), {"fit", "other", "third"}));
+    EXPECT_THAT(log(), HasSubstr("\n   third: "));
+    const ReadTable course = readDataTable(folder_.read("basin_ParetoCourse.dat"));
+    EXPECT_EQ(course.rows.back()[1], std::to_string(numbers.size()));
+    removeResults();
+  }
+}
+
+TEST_F(Pareto, SeriesAreThoseOfTheObservationsOrOfEveryStepOrNone) {
+  // Every fifth day is observed.
+  for (const char* file : {"observed.csv", "other.csv"}) {
+    std::string fifth;
+    int place = 0;
+    const std::string text = folder_.read(file);
+    for (const std::string_view line : splitLines(text)) {
+      const bool isDay = !line.empty() && line.front() >= '0' && line.front() <= '9';
+      if (!isDay || place++ % 5 == 0) fifth += std::string(line) + "\n";
+    }
+    ASSERT_EQ(place, 365);
+    folder_.write(file, fifth);
+  }
+  for (const auto& [kept, steps] : {std::pair("observations", 73), {"steps", 365}, {"none", 0}}) {
+    SCOPED_TRACE(kept);
+    writeSetup({.search = "NSGA-II", .maxEvaluations = 36},
+               fmt::format("Population_Size = 12\nFront_Series = '{}'", kept));
+    run();
+    EXPECT_EQ(folder_.exists("basin_ParetoSeries.dat"), steps > 0);
+    if (steps == 0) continue;
+    std::map<std::string, int> counts;
+    const ReadTable table = front();
+    for (const auto& row : readDataTable(folder_.read("basin_ParetoSeries.dat")).rows) {
+      const int day = counts[row[0] + row[1]]++ * 365 / steps;
+      const auto of = std::ranges::find_if(table.rows, [&](const auto& each) { return each[0] == row[0]; });
+      ASSERT_NE(of, table.rows.end()) << row[0];
+      const double expected =
+          numberInRow(table, *of, "a") + numberInRow(table, *of, "b") * std::sin(day / 58.0) + day / 365.0;
+      ASSERT_NEAR(realCell(row[3]).value(), expected, 1e-4) << row[0] << " " << row[2];
+    }
+    EXPECT_EQ(counts.size(), 2 * numbersOnFront(table).size());
+    for (const auto& [key, count] : counts) EXPECT_EQ(count, steps) << key;
+    removeResults();
+  }
+}
+
+TEST_F(Pareto, AJobHasTheRowsAndTheFrontOfOneProcess) {
+  if (!mpirunIsInstalled()) GTEST_SKIP() << "mpirun is not installed";
+  const auto rows = [this] {
+    std::string found;
+    const std::string text = results();
+    for (const std::string_view line : splitLines(text)) {
+      if (!line.starts_with('#')) found += std::string(line) + "\n";
+    }
+    return found;
+  };
+  folder_.useScript(kSleepByParameters);
+  for (const auto& [search, keywords] : {std::pair("NSGA-II", "Population_Size = 12"), {"PADDS", "Candidates = 3"}}) {
+    SCOPED_TRACE(search);
+    writeSetup({.search = search, .maxEvaluations = 40, .modelArguments = "--fail-above 9"}, keywords);
+    run();
+    const std::string expected = rows();
+    EXPECT_GT(occurrences(expected, "\n"), 365);
+    removeResults();
+    const ProgramResult job = startJob(4, {setup_}).wait();
+    ASSERT_EQ(job.exitCode, 0) << job.error << log();
+    EXPECT_EQ(rows(), expected);
     removeResults();
   }
 }

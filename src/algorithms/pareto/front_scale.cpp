@@ -20,12 +20,12 @@ double widthOf(double ideal, double nadir) {
 
 }  // namespace
 
-FrontScale::FrontScale(std::span<const std::vector<double>> front, std::span<const double> reference)
-    : ideal_(front.front()), nadir_(front.front()) {
-  for (const std::vector<double>& values : front) {
-    for (std::size_t i = 0; i < values.size(); ++i) {
-      ideal_[i] = std::min(ideal_[i], values[i]);
-      nadir_[i] = std::max(nadir_[i], values[i]);
+FrontScale::FrontScale(const PointTable& front, std::span<const double> reference)
+    : ideal_(front[0].begin(), front[0].end()), nadir_(ideal_) {
+  for (std::size_t k = 1; k < front.size(); ++k) {
+    for (std::size_t i = 0; i < ideal_.size(); ++i) {
+      ideal_[i] = std::min(ideal_[i], front[k][i]);
+      nadir_[i] = std::max(nadir_[i], front[k][i]);
     }
   }
   if (reference.size() == ideal_.size()) {
@@ -77,13 +77,12 @@ std::optional<std::size_t> nearestToIdeal(std::span<const FrontMember> members) 
 std::vector<FrontStage> frontCourse(const ParetoArchive& archive, std::span<const double> reference, int most) {
   std::vector<FrontStage> course;
   if (archive.members().empty()) return course;
-  const FrontScale scale(archive.front(), reference);
-  FrontHistory history(archive.entries());
+  const FrontScale scale(archive.points(), reference);
   const int last = archive.evaluationCount();
   const int count = std::min(most, last);
   for (int i = 1; i <= count; ++i) {
     const auto evaluations = static_cast<int>(std::int64_t{last} * i / count);
-    const std::vector<std::vector<double>>& front = history.frontAfter(evaluations);
+    const std::vector<std::vector<double>> front = archive.frontAfter(evaluations);
     course.push_back({evaluations, front.size(), scale.hypervolumeShare(front)});
   }
   return course;
@@ -93,12 +92,11 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
                                           bool isBudgetUsed) {
   const int count = archive.evaluationCount();
   if (archive.members().empty() || count < kFewestEvaluations) return {};
-  const FrontScale scale(archive.front(), reference);
+  const FrontScale scale(archive.points(), reference);
   if (!scale.isReferenceUsable()) return {};
-  FrontHistory history(archive.entries());
-  const double quarter = scale.hypervolumeShare(history.frontAfter(count / 4));
-  const double half = scale.hypervolumeShare(history.frontAfter(count / 2));
-  const double tenth = scale.hypervolumeShare(history.frontAfter(static_cast<int>(std::int64_t{count} * 9 / 10)));
+  const double quarter = scale.hypervolumeShare(archive.frontAfter(count / 4));
+  const double half = scale.hypervolumeShare(archive.frontAfter(count / 2));
+  const double tenth = scale.hypervolumeShare(archive.frontAfter(static_cast<int>(std::int64_t{count} * 9 / 10)));
   const double end = scale.hypervolumeShare(archive.front());
   const auto riseText = [](double from, double to) {
     if (to <= from) return std::string("did not grow");

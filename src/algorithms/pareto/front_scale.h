@@ -17,7 +17,9 @@ class FrontScale final {
  public:
   /// `front` must not be empty. `reference`: one value per objective, up to which the hypervolume counts; empty:
   /// kUsualReference on this scale.
-  explicit FrontScale(std::span<const std::vector<double>> front, std::span<const double> reference = {});
+  explicit FrontScale(const PointTable& front, std::span<const double> reference = {});
+  explicit FrontScale(std::span<const std::vector<double>> front, std::span<const double> reference = {})
+      : FrontScale(PointTable(front), reference) {}
 
   /// An objective without a range has the width 1.
   std::vector<double> scaled(std::span<const double> values) const;

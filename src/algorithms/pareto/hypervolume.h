@@ -4,6 +4,8 @@
 #include <span>
 #include <vector>
 
+#include "algorithms/pareto/point_table.h"
+
 namespace mirevo {
 
 /// The hypervolume of points that are minimised: the volume of what at least one of them dominates, up to `reference`
@@ -15,10 +17,9 @@ double hypervolume(std::span<const std::vector<double>> points, std::span<const 
 
 /// Of each point what the hypervolume would lose without it, for points of which none dominates another. Those that
 /// equal others have 0.
-std::vector<double> hypervolumeContributions(std::span<const std::vector<double>> points,
-                                             std::span<const double> reference);
+std::vector<double> hypervolumeContributions(const PointTable& points, std::span<const double> reference);
 
-/// Of more points the hypervolume takes long: minutes for a hundred fronts.
+/// Of more points the hypervolume would take long, as it is that of hundreds of fronts.
 std::size_t mostPointsOfHypervolume(std::size_t objectives);
 
 }  // namespace mirevo

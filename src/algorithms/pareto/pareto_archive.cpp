@@ -1,24 +1,44 @@
 #include "algorithms/pareto/pareto_archive.h"
 
-#include <algorithm>
-
-#include "algorithms/pareto/dominance.h"
-
 namespace mirevo {
 namespace {
 
-bool coversOther(std::span<const double> a, std::span<const double> b) {
-  return std::ranges::equal(a, b) || dominates(a, b);
+bool isAtMost(std::span<const double> a, std::span<const double> b) {
+  for (std::size_t i = 0; i < a.size(); ++i) {
+    if (!(a[i] <= b[i])) return false;
+  }
+  return true;
+}
+
+template <class Element>
+void leaveOut(std::vector<Element>& elements, const std::vector<bool>& isLeftOut) {
+  std::size_t place = 0;
+  std::erase_if(elements, [&](const Element&) { return isLeftOut[place++]; });
 }
 
 }  // namespace
 
 bool ParetoArchive::add(int number, const ParameterSet& set, const std::vector<double>& values) {
   ++evaluationCount_;
-  const auto covers = [&values](const FrontMember& member) { return coversOther(member.values, values); };
-  if (std::ranges::any_of(members_, covers)) return false;
-  std::erase_if(members_, [&values](const FrontMember& member) { return dominates(values, member.values); });
+  for (std::size_t i = 0; i < points_.size(); ++i) {
+    if (isAtMost(points_[i], values)) return false;
+  }
+  // Those that it is at most, it dominates: it equals none.
+  std::vector<bool> isDominated;
+  for (std::size_t i = 0; i < points_.size(); ++i) {
+    if (!isAtMost(values, points_[i])) continue;
+    isDominated.resize(points_.size());
+    isDominated[i] = true;
+    entries_[places_[i]].dominatedBy = evaluationCount_;
+  }
+  if (!isDominated.empty()) {
+    leaveOut(members_, isDominated);
+    leaveOut(places_, isDominated);
+    points_.leaveOut(isDominated);
+  }
   members_.push_back({number, set, values});
+  points_.add(values);
+  places_.push_back(entries_.size());
   entries_.push_back({evaluationCount_, values});
   return true;
 }
@@ -30,13 +50,13 @@ std::vector<std::vector<double>> ParetoArchive::front() const {
   return values;
 }
 
-const std::vector<std::vector<double>>& FrontHistory::frontAfter(int evaluations) {
-  for (; next_ < entries_.size() && entries_[next_].evaluation <= evaluations; ++next_) {
-    const std::vector<double>& values = entries_[next_].values;
-    std::erase_if(front_, [&values](const std::vector<double>& other) { return dominates(values, other); });
-    front_.push_back(values);
+std::vector<std::vector<double>> ParetoArchive::frontAfter(int evaluations) const {
+  std::vector<std::vector<double>> values;
+  for (const Entry& entry : entries_) {
+    if (entry.evaluation > evaluations) break;
+    if (entry.dominatedBy > evaluations) values.push_back(entry.values);
   }
-  return front_;
+  return values;
 }
 
 }  // namespace mirevo

@@ -1,9 +1,11 @@
 #pragma once
 
 #include <cstddef>
+#include <limits>
 #include <span>
 #include <vector>
 
+#include "algorithms/pareto/point_table.h"
 #include "common/parameter_set.h"
 
 namespace mirevo {
@@ -27,34 +29,27 @@ class ParetoArchive final {
   int evaluationCount() const { return evaluationCount_; }
   /// In the order of their evaluations.
   const std::vector<FrontMember>& members() const { return members_; }
+  /// The values of the members, in their order.
+  const PointTable& points() const { return points_; }
   std::vector<std::vector<double>> front() const;
 
   /// The values of a set that was on the front when it was evaluated.
   struct Entry {
     int evaluation = 0;  ///< counted from 1
     std::vector<double> values;
+    int dominatedBy = std::numeric_limits<int>::max();  ///< the first evaluation that dominates it, if there is one
   };
-  /// In that order. A front of the past is what no entry up to then dominates.
+  /// In that order.
   const std::vector<Entry>& entries() const { return entries_; }
+  /// The front after so many evaluations, in their order.
+  std::vector<std::vector<double>> frontAfter(int evaluations) const;
 
  private:
   int evaluationCount_ = 0;
   std::vector<FrontMember> members_;
+  PointTable points_;
+  std::vector<std::size_t> places_;  ///< of the members, among the entries
   std::vector<Entry> entries_;
-};
-
-/// The front after each of so many first `evaluations` (ascending).
-class FrontHistory final {
- public:
-  /// The entries must outlive the object.
-  explicit FrontHistory(std::span<const ParetoArchive::Entry> entries) : entries_(entries) {}
-  /// Evaluations never decrease from call to call.
-  const std::vector<std::vector<double>>& frontAfter(int evaluations);
-
- private:
-  std::span<const ParetoArchive::Entry> entries_;
-  std::size_t next_ = 0;
-  std::vector<std::vector<double>> front_;
 };
 
 }  // namespace mirevo

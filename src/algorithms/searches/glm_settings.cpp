@@ -1,4 +1,5 @@
 #include "algorithms/searches/glm.h"
+#include "common/settings/named_choice.h"
 
 namespace mirevo {
 namespace {
@@ -14,15 +15,10 @@ BoundSection GlmMethod::section() {
       {"OPTIMISATION_ALGORITHM/GLM_CONTROL_PARAMETERS",
        "when `Algorithm_Type` is `'GLM'`",
        "Gauss-Levenberg-Marquardt.",
-       {choice<Settings>(
-            [](Settings& filled, const SetupValue& value) {
-              for (std::size_t i = 0; i < std::size(kDifferenceNames); ++i) {
-                if (isCode(kDifferenceNames[i], value)) filled.differences = static_cast<GlmDifferences>(i);
-              }
-            },
+       {namedChoice<Settings, kDifferenceNames>(
+            [](auto& filled) -> auto& { return filled.differences; },
             {.name = "Differencing",
              .defaultValue = "'automatic'",
-             .codes = kDifferenceNames,
              .meaning = "Kind of differences: forward until an iteration gains less than a tenth of the sum of "
                         "squares and then central, or one of the two throughout."}),
         setting<&Settings::perturbationOption>(

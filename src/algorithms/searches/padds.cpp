@@ -91,7 +91,9 @@ ParameterSet Padds::drawOrigin() {
   while (!joined_.empty()) {
     ParameterSet next = std::move(joined_.front());
     joined_.pop_front();
-    const bool isLeft = std::ranges::any_of(members, [&next](const FrontMember& member) { return member.set == next; });
+    // From the last one on: it is among those that have joined the front lately.
+    const bool isLeft = std::any_of(members.rbegin(), members.rend(),
+                                    [&next](const FrontMember& member) { return member.set == next; });
     if (isLeft) return next;
   }
   if (members.empty()) return summary_.best;  // all runs so far have failed
@@ -104,14 +106,14 @@ ParameterSet Padds::drawOrigin() {
 
 /// Determines with which weights members of the front are drawn.
 void Padds::drawWeights() {
-  const std::vector<std::vector<double>> front = problem_.pareto->archive.front();
-  const std::size_t objectives = front.front().size();
+  const PointTable& front = problem_.pareto->archive.points();
+  const std::size_t objectives = front.width();
   std::size_t most = objectives > 2 ? kMostDrawn : front.size();
   if (settings_.selection == PaddsSelection::hypervolume) most = std::min(most, mostPointsOfHypervolume(objectives));
   drawable_ = spreadOver(front, most);
-  std::vector<std::vector<double>> values;
+  PointTable values;
   const FrontScale scale(front);
-  for (const std::size_t i : drawable_) values.push_back(scale.scaled(front[i]));
+  for (const std::size_t i : drawable_) values.add(scale.scaled(front[i]));
   weights_.assign(values.size(), 1.0);
   if (settings_.selection == PaddsSelection::hypervolume) {
     weights_ = hypervolumeContributions(values, std::vector<double>(objectives, FrontScale::kUsualReference));
@@ -145,15 +147,10 @@ BoundSection PaddsMethod::section() {
                              .range = kFraction,
                              .refusal = "Error: Perturbation parameter in PADDS algorithm invalid",
                              .meaning = std::string(kPerturbationMeaning)}),
-            choice<Method>(
-                [](Method& m, const SetupValue& value) {
-                  for (std::size_t i = 0; i < std::size(kPaddsSelectionNames); ++i) {
-                    if (isCode(kPaddsSelectionNames[i], value)) m.selection = static_cast<PaddsSelection>(i);
-                  }
-                },
+            namedChoice<Method, kPaddsSelectionNames>(
+                [](auto& m) -> auto& { return m.selection; },
                 {.name = "Selection",
                  .defaultValue = "'hypervolume'",
-                 .codes = kPaddsSelectionNames,
                  .meaning = "By what the set of the front that is perturbed is drawn: what it contributes to the "
                             "hypervolume, its crowding distance, or all alike."}),
             setting<Method>([](auto& m) -> auto& { return m.settings.candidates; },

@@ -74,10 +74,9 @@ bool ParetoSearch::hasHypervolumeSettled() {
   if (problem_.pareto->archive.members().empty()) return false;
   nextTest_ = made + std::max(1, window / kTestsOfWindow);
   const ParetoArchive& archive = problem_.pareto->archive;
-  FrontHistory history(archive.entries());
-  const auto& front = history.frontAfter(made - window);
+  const std::vector<std::vector<double>> front = archive.frontAfter(made - window);
   if (front.empty()) return false;
-  const FrontScale scale(archive.front(), settings_.referencePoint);
+  const FrontScale scale(archive.points(), settings_.referencePoint);
   const double now = scale.hypervolumeShare(archive.front());
   const double then = scale.hypervolumeShare(front);
   if (!(now > 0.0) || now - then >= settings_.hypervolumeChange * now) return false;

@@ -15,6 +15,7 @@
 #include "algorithms/searches/search_algorithm.h"
 #include "algorithms/searches/search_problem.h"
 #include "common/settings/keyword_row.h"
+#include "common/settings/named_choice.h"
 
 namespace mirevo {
 
@@ -118,15 +119,10 @@ std::vector<KeywordRow> paretoKeywordRows() {
            .defaultValue = kNoDefault,
            .meaning = "One value for each objective function: the point up to which the hypervolume counts. "
                       "Without it a tenth of the front's range behind the greatest value of each."}),
-      choice<Method>(
-          [](Method& m, const SetupValue& value) {
-            for (std::size_t i = 0; i < std::size(kFrontSeriesNames); ++i) {
-              if (isCode(kFrontSeriesNames[i], value)) m.pareto.series = static_cast<FrontSeries>(i);
-            }
-          },
+      namedChoice<Method, kFrontSeriesNames>(
+          [](auto& m) -> auto& { return m.pareto.series; },
           {.name = kFrontSeriesKeyword,
            .defaultValue = "'observations'",
-           .codes = kFrontSeriesNames,
            .meaning =
                "At which times the simulated series of the front are kept: those of the observations, every "
                "simulated step as well, or none. The series of all evaluations are kept on disk for it; with 'steps' "

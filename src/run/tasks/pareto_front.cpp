@@ -38,38 +38,35 @@ std::string heading(const std::string& name, std::span<const std::string> column
   return unique;
 }
 
-/// The front, and the members of the last population that are behind it.
+/// The front, and the members of the last population that are behind it. A member that nothing on the front dominates
+/// is on it, itself or one with equal values.
 std::vector<FrontRow> rowsOf(const ParetoProblem& problem) {
   std::vector<FrontRow> rows;
+  std::vector<ObjectivePoint> front;
   for (const FrontMember& member : problem.archive.members()) {
-    rows.push_back({{member.number, member.set, {member.values, 0.0}}, 1, 0.0});
+    front.push_back({member.values, 0.0});
+    rows.push_back({{member.number, member.set, front.back()}, 1, 0.0});
   }
-  const std::size_t frontSize = rows.size();
-  for (const ParetoPoint& point : problem.population) rows.push_back({point, 1, 0.0});
-  std::vector<ObjectivePoint> points;
-  points.reserve(rows.size());
-  for (const FrontRow& row : rows) points.push_back(row.point.objectives);
-  const std::vector<int> ranks = nondominationRanks(points);
-  for (std::size_t i = 0; i < rows.size(); ++i) rows[i].rank = ranks[i];
-  // A member that nothing dominates is on the front already, itself or one with equal values.
-  std::size_t place = 0;
-  std::erase_if(rows, [&](const FrontRow& row) { return place++ >= frontSize && row.rank == 1; });
+  std::vector<ObjectivePoint> behind;
+  for (const ParetoPoint& point : problem.population) {
+    const auto isAhead = [&](const ObjectivePoint& other) { return isConstraintDominated(point.objectives, other); };
+    if (std::ranges::none_of(front, isAhead)) continue;
+    behind.push_back(point.objectives);
+    rows.push_back({point, 1, 0.0});
+  }
+  const std::vector<int> ranks = nondominationRanks(behind);
+  for (std::size_t i = 0; i < ranks.size(); ++i) rows[front.size() + i].rank = 1 + ranks[i];
   std::ranges::stable_sort(rows, [](const FrontRow& a, const FrontRow& b) {
     if (a.rank != b.rank) return a.rank < b.rank;
     return a.point.objectives.values < b.point.objectives.values;
   });
   for (auto begin = rows.begin(); begin != rows.end();) {
     const auto end = std::find_if(begin, rows.end(), [&](const FrontRow& row) { return row.rank != begin->rank; });
-    std::vector<std::vector<double>> values;
-    for (auto row = begin; row != end; ++row) values.push_back(row->point.objectives.values);
-    const std::vector<double> crowding = crowdingDistances(values);
-    for (std::size_t i = 0; i < crowding.size(); ++i, ++begin) begin->crowding = crowding[i];
+    PointTable values;
+    for (auto row = begin; row != end; ++row) values.add(row->point.objectives.values);
+    for (const double crowding : crowdingDistances(values)) (begin++)->crowding = crowding;
   }
   return rows;
-}
-
-std::vector<std::vector<double>> frontOf(const ParetoProblem& problem) {
-  return problem.archive.front();
 }
 
 /// The series of one evaluation as rows of the file.
@@ -173,7 +170,7 @@ DataTable FrontFinding::frontTable(const TaskContext& context) const {
     table.columns.push_back(heading(objective.name, table.columns));
   }
   for (const std::string& name : context.space.names) table.columns.push_back(heading(name, table.columns));
-  const FrontScale scale(frontOf(problem_));
+  const FrontScale scale(problem_.archive.points());
   const FrontMember* const chosen = suggested();
   for (const FrontRow& row : rowsOf(problem_)) {
     const ObjectivePoint& objectives = row.point.objectives;
@@ -214,7 +211,7 @@ void FrontFinding::addSeries(const TaskContext& context, TaskOutcome& outcome) c
   std::size_t rowCount = 0;
   for (const SeriesOfFront& series : all) rowCount += series.times.size();
   if (rowCount == 0) return;
-  const std::vector<std::vector<double>> front = frontOf(problem_);
+  const std::vector<std::vector<double>> front = problem_.archive.front();
   const std::size_t most = std::clamp<std::size_t>(kMostSeriesRows / rowCount, 1, kMostSeries);
   std::vector<std::size_t> members = spreadOver(front, most);
   const std::size_t nearest = *nearestToIdeal(problem_.archive.members());
@@ -255,9 +252,9 @@ void FrontFinding::addFront(const TaskContext& context, int best, TaskOutcome& o
                                 formatReal(least.values[i]), least.number, formatReal(most.values[i]), most.number));
   }
   lines.push_back(fmt::format(
-      "Suggested compromise: evaluation {}, the set of the front nearest to the ideal point, each objective "
-      "function scaled to 0 to 1 over the front. It is a suggestion: what one objective is worth in terms "
-      "of another is not known here",
+      "Suggested compromise: evaluation {}, the set of the front nearest to the ideal point, each objective function "
+      "scaled to 0 to 1 over the front. It is a suggestion: what one objective is worth in terms of another is not "
+      "known here",
       chosen.number));
   for (std::size_t i = 0; i < context.objectives.size(); ++i) {
     const auto value = [i](const FrontMember& member) { return member.values[i]; };
@@ -273,7 +270,7 @@ void FrontFinding::addFront(const TaskContext& context, int best, TaskOutcome& o
                     best == chosen.number ? ", and the suggested one" : ", another point of the trade-off"));
   }
   if (!settings_.referencePoint.empty() &&
-      !FrontScale(frontOf(problem_), settings_.referencePoint).isReferenceUsable()) {
+      !FrontScale(problem_.archive.points(), settings_.referencePoint).isReferenceUsable()) {
     lines.push_back(fmt::format("Warning: No hypervolume: the front is nowhere below {}", kReferencePointKeyword));
   }
   outcome.tables.push_back(frontTable(context));
