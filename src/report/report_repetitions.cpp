@@ -15,21 +15,28 @@
 namespace mirevo {
 namespace {
 
-/// Columns of the table before those of the parameters, behind which the last one stands.
-constexpr std::string_view kColumns[] = {"Repetition", "Seed", "Evaluations", "Best_Evaluation", "Aggregate", "Loops"};
-constexpr std::size_t kFirstParameter = std::size(kColumns);
+/// Columns of the table before those of the parameters, behind which the last one stands. That of the hypervolume is
+/// there if the search finds fronts.
+constexpr std::string_view kColumns[] = {"Repetition", "Seed",  "Evaluations",     "Best_Evaluation",
+                                         "Aggregate",  "Loops", "Start_Aggregate", "Hypervolume"};
+constexpr std::size_t kHypervolume = std::size(kColumns) - 1;
 constexpr std::string_view kLastColumn = "Termination";
 
 double numberIn(const std::string& cell) {
   return realCell(cell).value_or(std::numeric_limits<double>::quiet_NaN());
 }
 
-bool isRepetitionTable(const ReadTable& table, std::size_t parameterCount) {
-  return table.columns.size() == kFirstParameter + parameterCount + 1 && table.columns.back() == kLastColumn &&
-         std::equal(std::begin(kColumns), std::end(kColumns), table.columns.begin());
+/// The place of the first parameter's column; empty if this is another table.
+std::optional<std::size_t> firstParameterOf(const ReadTable& table, std::size_t parameterCount) {
+  const std::size_t count = table.columns.size();
+  if (count != kHypervolume + parameterCount + 1 && count != kHypervolume + parameterCount + 2) return std::nullopt;
+  const std::size_t first = count - parameterCount - 1;
+  const bool isIt =
+      table.columns.back() == kLastColumn && std::equal(kColumns, kColumns + first, table.columns.begin());
+  return isIt ? std::optional(first) : std::nullopt;
 }
 
-std::optional<ReportedRepetition> readRepetition(const std::vector<std::string>& cells) {
+std::optional<ReportedRepetition> readRepetition(const std::vector<std::string>& cells, std::size_t firstParameter) {
   const auto number = parseInteger(cells[0]);
   const double aggregate = numberIn(cells[4]);
   if (!number) return std::nullopt;
@@ -40,8 +47,10 @@ std::optional<ReportedRepetition> readRepetition(const std::vector<std::string>&
                          aggregate,
                          parseInteger(cells[5]).value_or(0),
                          {},
-                         cells.back()};
-  for (std::size_t i = kFirstParameter; i + 1 < cells.size(); ++i) one.parameters.push_back(numberIn(cells[i]));
+                         cells.back(),
+                         numberIn(cells[6])};
+  if (firstParameter > kHypervolume) one.hypervolume = numberIn(cells[kHypervolume]);
+  for (std::size_t i = firstParameter; i + 1 < cells.size(); ++i) one.parameters.push_back(numberIn(cells[i]));
   return one;
 }
 
@@ -70,6 +79,16 @@ std::vector<ReportedStretch> readStretches(const std::string& filePrefix, std::s
   return stretches;
 }
 
+NearlyEqual nearlyEqualOf(const std::vector<ReportedRepetition>& all) {
+  double least = std::numeric_limits<double>::infinity();
+  std::vector<double> starts;
+  for (const ReportedRepetition& one : all) {
+    if (one.aggregate < least) least = one.aggregate;
+    starts.push_back(one.start);
+  }
+  return std::isfinite(least) ? nearlyEqual(least, starts) : NearlyEqual{};
+}
+
 }  // namespace
 
 std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePrefix, std::size_t parameterCount,
@@ -78,21 +97,24 @@ std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePr
   const auto text = readFileIfThere(path);
   if (!text) return std::nullopt;
   const ReadTable table = readDataTable(*text);
-  if (!isRepetitionTable(table, parameterCount)) {
+  const auto firstParameter = firstParameterOf(table, parameterCount);
+  if (!firstParameter) {
     faults.push_back(fmt::format("The repetitions are not shown: {} is damaged, or of other parameters than the setup",
                                  fileNameOf(path)));
     return std::nullopt;
   }
   ReportedRepetitions found;
-  found.parameters.assign(table.columns.begin() + kFirstParameter, table.columns.end() - 1);
+  found.parameters.assign(table.columns.begin() + static_cast<std::ptrdiff_t>(*firstParameter),
+                          table.columns.end() - 1);
   for (const std::vector<std::string>& cells : table.rows) {
-    if (auto one = readRepetition(cells)) found.all.push_back(*std::move(one));
+    if (auto one = readRepetition(cells, *firstParameter)) found.all.push_back(*std::move(one));
   }
   if (found.all.size() < table.rows.size()) {
     faults.push_back(fmt::format("{} of {} cannot be read and left out",
                                  countText(table.rows.size() - found.all.size(), "row"), fileNameOf(path)));
   }
   if (found.all.empty()) return std::nullopt;
+  found.nearly = nearlyEqualOf(found.all);
   std::string fault;
   found.stretches = readStretches(filePrefix, fault);
   if (!fault.empty()) faults.push_back(fault);
@@ -104,10 +126,13 @@ void writeRepetitions(JsonWriter& json, const ReportedRepetitions& repetitions) 
   for (const ReportedRepetition& one : repetitions.all) {
     json.beginObject().member("number", one.number).member("seed", one.seed).member("evaluations", one.evaluations);
     json.member("best", one.best).member("aggregate", one.aggregate).member("loops", one.loops);
+    json.member("start", one.start);
+    if (std::isfinite(one.hypervolume)) json.member("hypervolume", one.hypervolume);
     json.key("parameters").numbers(one.parameters, JsonWriter::Digits::table);
     json.member("termination", one.termination).endObject();
   }
-  json.endArray().key("stretches").beginArray();
+  json.endArray().member("tolerance", repetitions.nearly.tolerance).member("within", repetitions.nearly.text());
+  json.key("stretches").beginArray();
   for (const ReportedStretch& one : repetitions.stretches) {
     json.beginArray().integer(one.repetition).integer(one.first).integer(one.last).endArray();
   }

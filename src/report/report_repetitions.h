@@ -1,9 +1,11 @@
 #pragma once
 
+#include <limits>
 #include <optional>
 #include <string>
 #include <vector>
 
+#include "algorithms/searches/repetitions.h"
 #include "report/json_writer.h"
 
 namespace mirevo {
@@ -16,8 +18,10 @@ struct ReportedRepetition {
   int best = 0;  ///< the evaluation
   double aggregate = 0.0;
   int loops = 0;
-  std::vector<double> parameters;  ///< those of its best set, model scale
-  std::string termination;         ///< why it stopped
+  std::vector<double> parameters;                                 ///< those of its best set, model scale
+  std::string termination;                                        ///< why it stopped
+  double start = std::numeric_limits<double>::quiet_NaN();        ///< the least aggregate with which it began
+  double hypervolume = std::numeric_limits<double>::quiet_NaN();  ///< of its front; NaN if it finds none
 };
 
 /// Successive evaluations that are of one repetition.
@@ -31,6 +35,7 @@ struct ReportedRepetitions {
   std::vector<std::string> parameters;
   std::vector<ReportedRepetition> all;
   std::vector<ReportedStretch> stretches;  ///< none: whose evaluations are whose is not known
+  NearlyEqual nearly;                      ///< which aggregates count as equal to the least
 };
 
 /// The repetitions of a search; empty if there are none, or if they cannot be read, with the reason in `faults`, which

@@ -101,6 +101,28 @@ class ModelFolder : public TemporaryFolder {
     write("basin.kdx", text.substr(0, behind) + added + text.substr(behind));
     editSetup("[OUTPUT_MEASURES]\n      TqSEKdxListItemCount = 1", "[OUTPUT_MEASURES]\n      TqSEKdxListItemCount = 2");
   }
+  /// Adds to `basin.kdx` a second objective function, 'other', that judges the same series by observations of another
+  /// set, a = 7 and b = 1: what is gained at one is lost at the other.
+  void addOtherObjective() const {
+    if (!exists("other.csv")) {
+      const std::string before = read("model/parameters.txt");
+      write("model/parameters.txt", "a = 7\nb = 1\nc = 1\n");
+      EXPECT_EQ(
+          std::system(
+              fmt::format("cd '{}/model' && {} && cp simulated.csv ../other.csv", path(), MIREVO_TEST_MODEL).c_str()),
+          0);
+      write("model/parameters.txt", before);
+    }
+    addMeasure("flow of another", "");
+    std::string text = read("basin.kdx");
+    const auto second = text.find("[MEASURE_2]");
+    text.replace(text.find("'fit'", second), 5, "'other'");
+    text.replace(text.find("observed.csv", second), 12, "other.csv");
+    write("basin.kdx", text);
+    editSetup("[OBJECTIVE_FUNCTIONS]\n      TqSEKdxListItemCount = 1",
+              "[OBJECTIVE_FUNCTIONS]\n      TqSEKdxListItemCount = 2\n      [OBJECTIVE_2]\n        Name = 'other'\n"
+              "        Function_Type = 0\n        Weight = 1.0\n      [/OBJECTIVE_2]");
+  }
 
  private:
   /// tests/integration/basin.kdx, where the fields stand in braces by their names here.

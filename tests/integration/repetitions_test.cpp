@@ -1,4 +1,6 @@
 #include <algorithm>
+#include <limits>
+#include <map>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -15,9 +17,21 @@ constexpr const char* kInSideBySideOrder = "Repetition_Order = 'side by side'";
 /// Searches that are made several times.
 class Repeated : public ::testing::Test {
  protected:
+  /// Searches for a front have a small population, and GLM draws where it starts.
   void writeSetup(const RunSettings& settings, int count, const std::string& order) {
     setup_ = folder_.writeSetup(settings);
     folder_.editSetup("Use_Surrogate_Model", fmt::format("Repetitions = {}\n{}\nUse_Surrogate_Model", count, order));
+    const std::map<std::string, std::string> controls{
+        {"NSGA-II", "[NSGAII_CONTROL_PARAMETERS]\nPopulation_Size = 8\n[/NSGAII_CONTROL_PARAMETERS]\n"},
+        {"PADDS", "[PADDS_CONTROL_PARAMETERS]\nCandidates = 2\n[/PADDS_CONTROL_PARAMETERS]\n"},
+        {"GLM", "[GLM_CONTROL_PARAMETERS]\nSample_Size = 4\nStarts = 2\n[/GLM_CONTROL_PARAMETERS]\n"}};
+    if (const auto control = controls.find(settings.search); control != controls.end()) {
+      folder_.editSetup("    [SCE_CONTROL_PARAMETERS]", control->second + "    [SCE_CONTROL_PARAMETERS]");
+    }
+    if (findsFront(settings)) folder_.addOtherObjective();
+  }
+  static bool findsFront(const RunSettings& settings) {
+    return settings.search == "NSGA-II" || settings.search == "PADDS";
   }
   ProgramResult run(int processes = 0) const {
     return processes == 0 ? runProgram({setup_}) : startJob(processes, {setup_}).wait();
@@ -29,6 +43,10 @@ class Repeated : public ::testing::Test {
   /// All that a run has found.
   std::vector<std::string> results() const {
     std::vector<std::string> texts{withoutDates(folder_.read(kResults)), folder_.read(kTable), folder_.read(kRows)};
+    for (const char* const name :
+         {"basin_Pareto.dat", "basin_ParetoCourse.dat", "basin_ParetoSeries.dat", "basin_Optimisation_Jacobian.dat"}) {
+      if (folder_.exists(name)) texts.push_back(folder_.read(name));
+    }
     EXPECT_THAT(texts, Each(Not(IsEmpty())));
     return texts;
   }
@@ -56,6 +74,9 @@ TEST_F(Repeated, AnyNumberOfSlotsOrRanksMakesTheSameFiles) {
       {{.search = "PDDS", .maxEvaluations = 12}, kInSideBySideOrder, {4}, 0},
       {{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 30}, kInSideBySideOrder, {3}, 0},
       {{.algorithm = 1, .maxEvaluations = 14}, "", {3}, 3},
+      {{.search = "NSGA-II", .maxEvaluations = 20}, kInSideBySideOrder, {3}, 0},
+      {{.search = "PADDS", .maxEvaluations = 14}, kInSideBySideOrder, {4}, 0},
+      {{.search = "GLM", .maxEvaluations = 16}, kInSideBySideOrder, {3}, 0},
   };
   folder_.useScript(kSleepByParameters);
   for (auto [settings, order, slots, processes] : cases) {
@@ -78,30 +99,57 @@ TEST_F(Repeated, AnyNumberOfSlotsOrRanksMakesTheSameFiles) {
 }
 
 TEST_F(Repeated, ARunThatWasCutOffAnywhereGoesOnToTheSameFiles) {
-  for (const std::string order : {"", kInSideBySideOrder}) {
-    removeResults();
-    writeSetup({.algorithm = 0, .includesInitial = false, .maxEvaluations = 20, .restart = 1}, 3, order);
-    runToEnd();
-    const auto expected = results();
-    const std::string rows = folder_.read(kResults);
-    for (const char* last : {"\n5\t", "\n21\t", "\n34\t", "\n50\t"}) {
-      folder_.write(kResults, rows.substr(0, rows.find(last) + 9));
+  for (const RunSettings& settings :
+       {RunSettings{.algorithm = 0, .includesInitial = false, .maxEvaluations = 20, .restart = 1},
+        {.search = "NSGA-II", .maxEvaluations = 20, .restart = 1},
+        {.search = "PADDS", .maxEvaluations = 20, .restart = 1},
+        {.search = "GLM", .maxEvaluations = 20, .restart = 1}}) {
+    for (const std::string order : {"", kInSideBySideOrder}) {
+      SCOPED_TRACE(settings.search + order);
+      removeResults();
+      writeSetup(settings, 3, order);
       runToEnd();
-      EXPECT_EQ(results(), expected) << last << order;
-      EXPECT_THAT(log(), HasSubstr("evaluations are taken from"));
+      const auto expected = results();
+      EXPECT_EQ(expected.size(), findsFront(settings) ? 6U : settings.search == "GLM" ? 4U : 3U);
+      const std::string rows = folder_.read(kResults);
+      for (const char* last : {"\n34\t", "\n5\t", "\n21\t", "\n50\t"}) {
+        if (!settings.search.empty() && std::string_view(last) != "\n34\t") continue;
+        folder_.write(kResults, rows.substr(0, rows.find(last) + 9));
+        runToEnd();
+        EXPECT_EQ(results(), expected) << last;
+        EXPECT_THAT(log(), HasSubstr("evaluations are taken from"));
+      }
     }
   }
 }
 
+TEST_F(Repeated, TheLimitsOfGlmAreThoseOfTheBestRepetition) {
+  writeSetup({.search = "GLM", .includesInitial = false, .maxEvaluations = 14}, 3, kInSideBySideOrder);
+  runToEnd();
+  double least = std::numeric_limits<double>::infinity();
+  std::string best;
+  const ReadTable found = table();
+  for (const auto& row : found.rows) {
+    if (const double aggregate = realCell(row[4]).value(); aggregate < least) {
+      least = aggregate;
+      best = row[3];
+    }
+  }
+  EXPECT_THAT(log(), HasSubstr(fmt::format("Covariance at evaluation {}, the estimate", best)));
+}
+
 TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
   const RunSettings settings{.algorithm = 1, .maxEvaluations = 20, .restart = 1};
-  for (const auto& [before, cutAt] : {std::pair(1, ""), std::pair(2, ""), std::pair(2, "\n25\t")}) {
+  const RunSettings ofFronts{.search = "PADDS", .maxEvaluations = 20, .restart = 1};
+  for (const auto& [of, before, cutAt] :
+       {std::tuple(ofFronts, 1, ""), std::tuple(ofFronts, 2, "\n25\t"), std::tuple(settings, 1, ""),
+        std::tuple(settings, 2, ""), std::tuple(settings, 2, "\n25\t")}) {
     removeResults();
-    writeSetup(settings, before, "");
+    writeSetup(of, before, "");
     runToEnd();
     const std::string rows = folder_.read(kResults);
     if (*cutAt != '\0') folder_.write(kResults, rows.substr(0, rows.find(cutAt) + 9));
-    writeSetup(settings, 3, "");
+    writeSetup(of, 3, "");
     runToEnd();
     EXPECT_THAT(log(), HasSubstr(fmt::format("Repetitions was raised from {} to 3: further ones follow", before)));
     const auto found = results();
@@ -133,13 +181,17 @@ TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
 TEST_F(Repeated, WhatEndsARunLeavesTheRepetitionsAsFarAsTheyHadCome) {
   // After 12 model runs each waits for the one that cancels, or fails.
   const std::string counted = "n=1; while ! mkdir ../tickets/$n; do n=$((n + 1)); done 2>/dev/null\n";
-  for (const std::string order : {"", kInSideBySideOrder}) {
+  for (const auto& [search, order] : {std::pair<std::string, std::string>("PDDS", ""),
+                                      {"PDDS", kInSideBySideOrder},
+                                      {"PADDS", ""},
+                                      {"NSGA-II", kInSideBySideOrder}}) {
     for (const bool fails : {false, true}) {
+      SCOPED_TRACE(search + order);
       removeResults();
       std::filesystem::remove_all(folder_ / "tickets");
       std::filesystem::create_directory(folder_ / "tickets");
       folder_.useScript(counted + (fails ? "test $n -gt 12 && exit 3" : "while test $n -gt 12; do sleep 0.05; done"));
-      writeSetup({.search = "PDDS", .maxEvaluations = 10, .slots = 2}, 3, order);
+      writeSetup({.search = search, .maxEvaluations = 10, .slots = 2}, 3, order);
       RunningProgram program({setup_});
       if (!fails) {
         ASSERT_TRUE(waitUntil([&] { return folder_.exists("tickets/14"); }));
@@ -155,8 +207,25 @@ TEST_F(Repeated, WhatEndsARunLeavesTheRepetitionsAsFarAsTheyHadCome) {
       EXPECT_THAT(found.headLines, Contains(StartsWith("Unfinished run: statistics of ")));
       EXPECT_EQ(found.rows[0].back().empty(), !order.empty()) << "the first one has ended where they are consecutive";
       EXPECT_EQ(found.rows[1].back(), "");
-      for (const auto& row : found.rows) EXPECT_NE(row[3], "0") << "each has a best set";
+      // The 12 runs do not reach the third sample of NSGA-II, of 8 sets.
+      const std::size_t count = search == "NSGA-II" ? 2 : found.rows.size();
+      for (std::size_t i = 0; i < count; ++i) EXPECT_NE(found.rows[i][3], "0") << "each has a best set";
       EXPECT_FALSE(readDataTable(folder_.read(kRows)).rows.empty());
+      if (search == "PDDS") continue;
+      // The front is that of all that had succeeded, whether a search had taken it or not.
+      EXPECT_THAT(log(), HasSubstr("no other set dominates, of 1"));
+      const ReadTable front = readDataTable(folder_.read("basin_Pareto.dat"));
+      EXPECT_THAT(front.headLines, Contains(StartsWith("Unfinished run: statistics of ")));
+      ASSERT_FALSE(front.rows.empty());
+      const auto rows = readDataTable(folder_.read(kResults)).rows;
+      for (const std::size_t objective : {6U, 7U}) {  // in both tables
+        const auto leastOf = [objective](const auto& all) {
+          double least = std::numeric_limits<double>::infinity();
+          for (const auto& row : all) least = std::min(least, realCell(row.at(objective)).value());
+          return least;
+        };
+        EXPECT_EQ(leastOf(front.rows), leastOf(rows));
+      }
     }
   }
 }
@@ -166,7 +235,6 @@ TEST_F(Repeated, ASetupIsCheckedWithItsRepetitions) {
       {{}, 0, "", "Error: No. of repetitions of the search invalid"},
       {{}, 1001, "", "Error: No. of repetitions of the search invalid"},
       {{}, 2, "Repetition_Order = 'at once'", "'side by side'"},
-      {{.search = "GLM"}, 2, "", "expected 1 for GLM, found 2: its Starts begin at several sets of one sample"},
       {{.maxEvaluations = 1500000000}, 2, "", "expected at most 1073741823 for Repetitions = 2, found 1500000000"},
       {{.slots = 2},
        2,
@@ -179,6 +247,21 @@ TEST_F(Repeated, ASetupIsCheckedWithItsRepetitions) {
     const ProgramResult result = runProgram({"--check", setup_});
     EXPECT_EQ(result.exitCode, 1);
     EXPECT_THAT(result.output + result.error, HasSubstr(reason)) << count << order;
+  }
+  writeSetup({.search = "GLM"}, 2, "");
+  folder_.editSetup("Sample_Size = 4\nStarts = 2", "");
+  const ProgramResult glm = runProgram({"--check", setup_});
+  EXPECT_EQ(glm.exitCode, 1);
+  EXPECT_THAT(glm.output + glm.error,
+              HasSubstr("expected 1, found 2: the repetitions of GLM would be the same, as all "
+                        "would start from the one set that is given. A Sample_Size or Starts above 1"));
+  // What would end another search has no effect on one for a front, which has a budget of five generations here.
+  for (const auto& [loops, change, isWarned] : {std::tuple(5, 0.001, true), {5, 0.0, false}, {6, 0.001, false}}) {
+    writeSetup({.search = "NSGA-II", .maxEvaluations = 40}, 2, "");
+    folder_.editSetup("No_Loops_Convergence = 5", fmt::format("No_Loops_Convergence = {}", loops));
+    folder_.editSetup("Min_Change = 0.001", fmt::format("Min_Change = {}", change));
+    EXPECT_EQ(occurrences(runProgram({"--check", setup_}).output, "has no effect: NSGA-II ends with its budget"),
+              isWarned ? 2 : 0);
   }
   writeSetup({.maxEvaluations = 25, .slots = 8}, 4, kInSideBySideOrder);
   const ProgramResult result = runProgram({"--check", setup_});

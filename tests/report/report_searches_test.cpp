@@ -20,6 +20,7 @@ using ::testing::AllOf;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
+using ::testing::Not;
 
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
 
@@ -156,15 +157,22 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   EXPECT_THAT(faults_, IsEmpty()) << "a search has none as a rule";
   using Row = std::vector<DataTable::Cell>;
   const auto row = [](std::int64_t number, double aggregate) {
-    return Row{number,     number + 4, std::int64_t{60},
-               3 * number, aggregate,  std::int64_t{7},
-               0.1,        1.0 / 3.0,  std::string("the budget\tis used up")};
+    return Row{number,
+               number + 4,
+               std::int64_t{60},
+               3 * number,
+               aggregate,
+               std::int64_t{7},
+               9.5,
+               0.1,
+               1.0 / 3.0,
+               std::string("the budget\tis used up")};
   };
-  const DataTable table{
-      run_files::kRepetitions,
-      {},
-      {"Repetition", "Seed", "Evaluations", "Best_Evaluation", "Aggregate", "Loops", "a", "b # c", "Termination"},
-      {row(1, 0.5), row(2, std::nan(""))}};
+  DataTable table{run_files::kRepetitions,
+                  {},
+                  {"Repetition", "Seed", "Evaluations", "Best_Evaluation", "Aggregate", "Loops", "Start_Aggregate", "a",
+                   "b # c", "Termination"},
+                  {row(1, 0.5), row(2, std::nan(""))}};
   const std::string whole = dataTableText(table);
   write(run_files::kRepetitions, whole);
   const auto alone = repetitions();
@@ -186,9 +194,10 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   json.beginObject();
   writeRepetitions(json, *found);
   EXPECT_THAT(json.endObject().take(),
-              AllOf(HasSubstr(R"("number":2,"seed":6,"evaluations":60,"best":6,"aggregate":null,"loops":7,)"
+              AllOf(HasSubstr(R"("number":2,"seed":6,"evaluations":60,"best":6,"aggregate":null,"loops":7,"start":9.5,)"
                               R"("parameters":[0.1,0.3333333333],"termination":"the budget\u0009is used up")"),
-                    HasSubstr(R"("stretches":[[1,1,10],[2,11,20]])")));
+                    HasSubstr(R"("tolerance":0.009,"within":"0.009 of the least")"),
+                    HasSubstr(R"("stretches":[[1,1,10],[2,11,20]])"), Not(HasSubstr("hypervolume"))));
 
   write(run_files::kRepetitionRows, "Repetition\tFirst\n1\t1\n");
   EXPECT_TRUE(repetitions());
@@ -202,6 +211,15 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   EXPECT_THAT(faults_.front(), HasSubstr("1 row of basin_Optimisation_Repetitions.dat cannot be read"));
   write(run_files::kRepetitions, whole.substr(0, whole.find("\n1\t") + 4));
   EXPECT_FALSE(repetitions());
+
+  table.columns.insert(table.columns.begin() + 7, "Hypervolume");
+  for (Row& cells : table.rows) cells.insert(cells.begin() + 7, 0.75);
+  write(run_files::kRepetitions, dataTableText(table));
+  const auto ofFronts = repetitions();
+  ASSERT_TRUE(ofFronts);
+  EXPECT_EQ(ofFronts->all[1].hypervolume, 0.75);
+  EXPECT_THAT(ofFronts->parameters, ElementsAre("a", "b # c"));
+  EXPECT_EQ(ofFronts->all[1].parameters[1], 1.0 / 3.0);
 }
 
 }  // namespace

@@ -16,7 +16,7 @@ struct CongruentialGenerator {
   constexpr std::int64_t largestProduct() const { return std::int64_t{multiplier} * (modulus - 1) + increment; }
 };
 
-constexpr CongruentialGenerator kFirst{259200, 7141, 54773};
+constexpr CongruentialGenerator kFirst{UniformGenerator::kSeedPeriod, 7141, 54773};
 constexpr CongruentialGenerator kSecond{134456, 8121, 28411};
 constexpr CongruentialGenerator kThird{243000, 4561, 51349};
 static_assert(kFirst.largestProduct() <= INT32_MAX && kSecond.largestProduct() <= INT32_MAX &&

@@ -15,6 +15,9 @@ class UniformGenerator final {
   /// The next deviate in (0, 1). The state can reach neither 0 nor 1 from any seed: docs/algorithms/random-numbers.md.
   double next() { return uniformDeviate(seedVariable_); }
 
+  /// Seeds that differ by this have the same stream.
+  static constexpr std::int32_t kSeedPeriod = 259200;
+
   /// The generator itself: a negative `idum`, or the first call, initialises it, after which `idum` is 1.
   double uniformDeviate(std::int32_t& idum);
 

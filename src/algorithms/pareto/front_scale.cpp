@@ -89,7 +89,7 @@ std::vector<FrontStage> frontCourse(const ParetoArchive& archive, std::span<cons
 }
 
 std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::span<const double> reference,
-                                          bool isBudgetUsed) {
+                                          bool isBudgetUsed, bool isRepetition) {
   const int count = archive.evaluationCount();
   if (archive.members().empty() || count < kFewestEvaluations) return {};
   const FrontScale scale(archive.points(), reference);
@@ -105,20 +105,25 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
   std::vector<std::string> lines;
   lines.push_back(fmt::format(
       "Course: in the second half of the evaluations the hypervolume {}, in the last tenth it {}; the last set to join "
-      "the front was evaluation {} of {}",
-      riseText(half, end), riseText(tenth, end), archive.entries().back().evaluation, count));
+      "the front was {}evaluation {} of {}",
+      riseText(half, end), riseText(tenth, end), isRepetition ? "its " : "", archive.entries().back().evaluation,
+      count));
+  const std::string_view others = isRepetition ? "the other repetitions" : "other values of Random_Seed";
   if (!isBudgetUsed) {
-    lines.emplace_back(
-        "The search had ended by itself, before its budget was used up. A restart with a larger one takes it further; "
-        "other values of Random_Seed can tell whether there is a better front");
+    lines.push_back(fmt::format(
+        "The search had ended by itself, before its budget was used up. {}; {} can tell whether there is a better "
+        "front",
+        isRepetition ? "A smaller Hypervolume_Change would have taken it further"
+                     : "A restart with a larger one takes it further",
+        others));
     return lines;
   }
   const double later = end - half;
   const double earlier = half - quarter;
   const double rise = earlier > later ? later * later / earlier : later;
   if (rise <= kNoted * end) {
-    lines.emplace_back(
-        "The hypervolume has come to rest. Other values of Random_Seed can tell whether there is a better front");
+    lines.push_back(
+        fmt::format("The hypervolume has come to rest; {} can tell whether there is a better front", others));
   } else {
     lines.push_back(
         fmt::format("If it went on growing as it did, {} more evaluations would add about {:.2g} % to it. Such a trend "

@@ -55,7 +55,8 @@ struct FrontStage {
 std::vector<FrontStage> frontCourse(const ParetoArchive& archive, std::span<const double> reference, int most);
 
 /// Lines for people about the hypervolume of a search that has ended. `isBudgetUsed`: it could have gone on.
+/// `isRepetition`: it is one of several with other seeds, and its evaluations are counted for themselves.
 std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::span<const double> reference,
-                                          bool isBudgetUsed);
+                                          bool isBudgetUsed, bool isRepetition = false);
 
 }  // namespace mirevo

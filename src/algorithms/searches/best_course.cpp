@@ -51,14 +51,16 @@ double BestCourse::expectedFall() const {
   return earlier > later ? later * later / earlier : later;
 }
 
-std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed) {
+std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed, bool isRepetition) {
   const int count = course.evaluationCount();
   if (course.steps().empty() || count < kFewestEvaluations) return {};
   const double best = course.steps().back().aggregate;
   const double half = course.bestAfter(0.5 * count);
   const double tenth = course.bestAfter(0.9 * count);
   std::vector<std::string> lines;
-  const std::string found = fmt::format("found by evaluation {} of {}", course.steps().back().evaluation, count);
+  const std::string found = fmt::format("found by {}evaluation {} of {}", isRepetition ? "its " : "",
+                                        course.steps().back().evaluation, count);
+  const std::string_view others = isRepetition ? "the other repetitions" : "other values of Random_Seed";
   if (half >= kFailedRunValue) {
     lines.push_back(
         fmt::format("Course: the best value, {}, was {}; none of the first half succeeded", formatReal(best), found));
@@ -72,23 +74,24 @@ std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed
         found));
   }
   if (!isBudgetUsed) {
-    lines.emplace_back(
-        "A larger budget would not have changed this: the search had ended by itself. Whether there is a better value "
-        "elsewhere, other values of Random_Seed can tell");
+    lines.push_back(
+        fmt::format("A larger budget would not have changed this: the search had ended by itself. Whether there is a "
+                    "better value elsewhere, {} can tell",
+                    others));
     return lines;
   }
   const double fall = course.expectedFall();
   if (half >= kFailedRunValue) return lines;
   if (fall <= kNoted * std::abs(best)) {
-    lines.emplace_back(
-        "The best value has come to rest. A longer run may yet leave its valley, and other values of Random_Seed can "
-        "tell "
-        "whether there is a better one elsewhere");
+    lines.push_back(
+        fmt::format("The best value has come to rest. A longer run may yet leave its valley, and {} can tell whether "
+                    "there is a better one elsewhere",
+                    others));
   } else {
     lines.push_back(fmt::format(
         "If it went on falling as it did, {} more evaluations would bring it to about {:.3g}. Such a trend is "
         "rough: what comes is often a fraction of it, and now and then several times as much",
-        count, best - fall));
+        count, best > 0.0 ? std::max(0.0, best - fall) : best - fall));
   }
   return lines;
 }

@@ -35,7 +35,8 @@ class BestCourse final {
   std::vector<Step> steps_;  ///< those at which the best fell
 };
 
-/// Lines for people about a search that has ended. `isBudgetUsed`: it could have gone on.
-std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed);
+/// Lines for people about a search that has ended. `isBudgetUsed`: it could have gone on. `isRepetition`: it is one of
+/// several with other seeds, and its evaluations are counted for themselves.
+std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed, bool isRepetition = false);
 
 }  // namespace mirevo

@@ -472,8 +472,7 @@ const SearchFacts& GlmMethod::facts() const {
                                       .runsInParallel = true,
                                       .drawsInitialSample = true,
                                       .needsRanges = true,
-                                      .usesResiduals = true,
-                                      .whyNotRepeated = "its Starts begin at several sets of one sample"};
+                                      .usesResiduals = true};
   return kFacts;
 }
 
@@ -503,6 +502,18 @@ std::optional<SettingRefusal> GlmMethod::refusalFor(const SearchSpace& space) co
 
 std::int64_t GlmMethod::sampleSize(const InitialSampleSettings& sample, int /*budget*/) const {
   return static_cast<std::int64_t>(sampleCount(settings, sample));
+}
+
+std::string GlmMethod::seedDoubt(const InitialSampleSettings& sample) const {
+  const std::size_t count = sampleCount(settings, sample);
+  const std::size_t given = givenSetCount(sample, sample.earlierSetCount, count);
+  if (given < count) return {};
+  if (sample.generation == SampleGeneration::fromFile) {
+    return "all sets of its sample are those of Initial_Sample_File_Name. With another Initial_Sample_Generation they "
+           "are drawn";
+  }
+  return fmt::format("all would start from {}. A Sample_Size or Starts above {} in GLM_CONTROL_PARAMETERS draws others",
+                     given == 1 ? "the one set that is given" : fmt::format("the same {} given sets", given), given);
 }
 
 RaisedBudget GlmMethod::raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,

@@ -124,6 +124,8 @@ class GlmMethod final : public SearchMethod {
   std::optional<SettingRefusal> refusalFor(const SearchSpace& space) const override;
   bool evaluatesSample(const InitialSampleSettings& /*sample*/) const override { return false; }
   std::int64_t sampleSize(const InitialSampleSettings& sample, int budget) const override;
+  /// Only sets that are drawn depend on the seed.
+  std::string seedDoubt(const InitialSampleSettings& sample) const override;
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const override;
   std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;

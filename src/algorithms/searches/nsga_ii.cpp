@@ -217,8 +217,7 @@ const SearchFacts& NsgaIiMethod::facts() const {
                                       .drawsInitialSample = true,
                                       .needsRanges = true,
                                       .findsFront = true,
-                                      .populationKeywords = kPopulationKeyword,
-                                      .whyNotRepeated = kFrontNotRepeated};
+                                      .populationKeywords = kPopulationKeyword};
   return kFacts;
 }
 

@@ -130,8 +130,7 @@ const SearchFacts& PaddsMethod::facts() const {
   static constexpr SearchFacts kFacts{.name = {std::nullopt, "PADDS"},
                                       .longName = "Pareto Archived Dynamically Dimensioned Search",
                                       .runsInParallel = true,
-                                      .findsFront = true,
-                                      .whyNotRepeated = kFrontNotRepeated};
+                                      .findsFront = true};
   return kFacts;
 }
 

@@ -12,6 +12,10 @@
 
 namespace mirevo {
 
+bool hasObjectives(const EvaluationResult& result) {
+  return result.ok() && std::ranges::all_of(result.objectiveValues, [](double value) { return std::isfinite(value); });
+}
+
 ParetoSearch::ParetoSearch(ParetoSettings settings, SearchProblem problem)
     : problem_(std::move(problem)), feasible_(problem_.feasibility), settings_(std::move(settings)) {}
 
@@ -50,10 +54,8 @@ ParetoPoint ParetoSearch::take(const ParameterSet& set, const EvaluationResult& 
     summary_.bestResult = result;
   }
   ParetoPoint point{result.number, set, {result.objectiveValues, 0.0}};
-  const bool isKnown =
-      result.ok() && std::ranges::all_of(result.objectiveValues, [](double value) { return std::isfinite(value); });
   bool entered = false;
-  if (isKnown) {
+  if (hasObjectives(result)) {
     entered = problem_.pareto->archive.add(result.number, set, result.objectiveValues);
   } else {
     const bool isOfConstraints = !result.ok() && result.failure->isOfConstraints();

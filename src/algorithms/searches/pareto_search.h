@@ -46,6 +46,9 @@ struct ParetoProblem {
   std::vector<ParetoPoint> population = {};  ///< the last one; empty of a search without
 };
 
+/// Whether all objectives of an evaluation are known, so that it may be on a front.
+bool hasObjectives(const EvaluationResult& result);
+
 inline constexpr std::string_view kReferencePointKeyword = "Reference_Point";
 inline constexpr std::string_view kFrontSeriesKeyword = "Front_Series";
 inline constexpr std::string_view kHypervolumeSettledMessage =

@@ -1,52 +1,63 @@
-// What the log says of the repetitions of a search.
+#include "algorithms/searches/repetition_words.h"
+
 #include <algorithm>
 #include <cmath>
+#include <utility>
 
 #include <fmt/core.h>
 
 #include "algorithms/numbers/sample_summary.h"
-#include "algorithms/searches/repetitions.h"
 #include "common/take_text.h"
 #include "common/text.h"
 
 namespace mirevo {
-namespace {
-
-constexpr std::size_t kMostNamed = 20;  // parameters in a sentence
-
-/// Of values in any order.
-struct Spread {
-  double least = 0.0;
-  double median = 0.0;
-  double greatest = 0.0;
-};
 
 Spread spreadOf(std::vector<double> values) {
   std::ranges::sort(values);
   return {values.front(), sortedQuantile(values, 0.5), values.back()};
 }
 
-/// The share of its range that parameter k takes up in these best sets, on the search scale.
-double rangeShare(std::span<const Repetition* const> repetitions, const SearchSpace& space, std::size_t k) {
-  const double range = space.upper[k] - space.lower[k];
-  if (!(range > 0.0)) return 0.0;
-  std::vector<double> values;
-  for (const Repetition* repetition : repetitions) values.push_back(repetition->best[k]);
-  const Spread spread = spreadOf(std::move(values));
-  return (spread.greatest - spread.least) / range;
+std::string repetitionHeading(std::size_t count, std::int32_t planned) {
+  return static_cast<std::int64_t>(count) == planned
+             ? fmt::format("The {} repetitions of the search:", planned)
+             : fmt::format("The {} of {} repetitions of the search that had begun:", count, planned);
 }
 
-std::string whyText(const Repetition& repetition) {
+std::string whyItStopped(const Repetition& repetition) {
   std::string_view why = repetition.termination;
   takeText(why, "Optimisation terminated: ");
   return why.empty() ? "has not ended" : std::string(why);
 }
 
+double rangeShare(const std::vector<const Repetition*>& repetitions, const SearchSpace& space, std::size_t k) {
+  const double range = space.upper[k] - space.lower[k];
+  if (!(range > 0.0)) return 0.0;
+  std::vector<double> values;
+  values.reserve(repetitions.size());
+  for (const Repetition* repetition : repetitions) values.push_back(repetition->best[k]);
+  const Spread spread = spreadOf(std::move(values));
+  return (spread.greatest - spread.least) / range;
+}
+
+std::vector<std::vector<double>> parameterSpreads(const std::vector<const Repetition*>& repetitions,
+                                                  const SearchSpace& space) {
+  std::vector<std::vector<double>> rows;
+  for (std::size_t k = 0; k < space.size(); ++k) {
+    std::vector<double> values;
+    values.reserve(repetitions.size());
+    for (const Repetition* repetition : repetitions) values.push_back(toModelScale(space, k, repetition->best[k]));
+    const Spread spread = spreadOf(std::move(values));
+    rows.push_back({spread.least, spread.median, spread.greatest, 100.0 * rangeShare(repetitions, space, k)});
+  }
+  return rows;
+}
+
+namespace {
+
+constexpr std::size_t kMostNamed = 20;  // parameters in a sentence
+
 std::vector<std::string> tableLines(std::span<const Repetition> repetitions, std::int32_t planned) {
-  std::vector<std::string> lines{
-      std::ssize(repetitions) == planned
-          ? fmt::format("The {} repetitions of the search:", planned)
-          : fmt::format("The {} of {} repetitions of the search that had begun:", repetitions.size(), planned)};
+  std::vector<std::string> lines{repetitionHeading(repetitions.size(), planned)};
   lines.push_back(fmt::format("   {:>3} {:>11} {:>11} {:>14} {:>14}  {}", "No.", "seed", "evaluations", "best value",
                               "found by No.", "why it stopped"));
   int number = 0;
@@ -54,9 +65,14 @@ std::vector<std::string> tableLines(std::span<const Repetition> repetitions, std
     const bool hasBest = repetition.bestEvaluation > 0;
     lines.push_back(fmt::format("   {:>3} {:>11} {:>11} {:>14} {:>14}  {}", ++number, repetition.seed,
                                 repetition.evaluations, hasBest ? fmt::format("{:.6g}", repetition.aggregate) : "none",
-                                hasBest ? fmt::format("{}", repetition.bestEvaluation) : "", whyText(repetition)));
+                                hasBest ? fmt::format("{}", repetition.bestEvaluation) : "", whyItStopped(repetition)));
   }
   return lines;
+}
+
+/// Whether it found a set that is better than those that it began with.
+bool hasImproved(const Repetition& repetition) {
+  return !(repetition.aggregate >= repetition.startAggregate);
 }
 
 class SpreadText final {
@@ -64,19 +80,31 @@ class SpreadText final {
   /// `ended`: those that have ended with a best set, two or more.
   SpreadText(std::vector<const Repetition*> ended, const SearchSpace& space) : ended_(std::move(ended)), space_(space) {
     std::vector<double> values;
-    for (const Repetition* repetition : ended_) values.push_back(repetition->aggregate);
+    std::vector<double> starts;
+    for (const Repetition* repetition : ended_) {
+      values.push_back(repetition->aggregate);
+      starts.push_back(repetition->startAggregate);
+    }
     values_ = spreadOf(std::move(values));
-    const double most = values_.least + kNearlyEqualShare * std::abs(values_.least);
+    nearly_ = nearlyEqual(values_.least, starts);
+    const double most = values_.least + nearly_.tolerance;
     std::ranges::copy_if(ended_, std::back_inserter(near_),
                          [most](const Repetition* repetition) { return repetition->aggregate <= most; });
+    improved_ = static_cast<std::size_t>(
+        std::ranges::count_if(ended_, [](const Repetition* repetition) { return hasImproved(*repetition); }));
   }
 
   std::vector<std::string> lines() const {
-    std::vector<std::string> lines{fmt::format(
-        "Best values: least {:.6g}, median {:.6g}, greatest {:.6g}; {} of {} repetitions ended within {:g} % of the "
-        "least",
-        values_.least, values_.median, values_.greatest, near_.size(), ended_.size(), 100.0 * kNearlyEqualShare)};
+    const std::string values = fmt::format("Best values: least {:.6g}, median {:.6g}, greatest {:.6g}", values_.least,
+                                           values_.median, values_.greatest);
+    if (improved_ == 0) return {values, noneImprovedText()};
+    std::vector<std::string> lines{
+        fmt::format("{}; {} of {} repetitions ended within {}", values, near_.size(), ended_.size(), nearly_.text())};
     for (std::string& line : parameterTable()) lines.push_back(std::move(line));
+    if (improved_ < ended_.size()) {
+      lines.push_back(fmt::format("{} of {} repetitions found nothing better than what they began with",
+                                  ended_.size() - improved_, ended_.size()));
+    }
     if (!isSameEachTime()) lines.push_back(otherMinimaText());
     const std::string wide = wideParameters();
     if (near_.size() < 2) return lines;
@@ -97,28 +125,35 @@ class SpreadText final {
  private:
   bool isSameEachTime() const { return near_.size() == ended_.size(); }
 
+  std::string noneImprovedText() const {
+    const bool isOne = std::ranges::all_of(
+        ended_, [this](const Repetition* repetition) { return repetition->start == ended_.front()->start; });
+    return fmt::format(
+        "None of the {} repetitions found anything better than {}, which says nothing of a minimum: the start may be "
+        "one, or the search does not get away from it. A larger budget can tell{}",
+        ended_.size(), isOne ? "the set that all of them began with" : "the sets that it began with",
+        isOne ? ", or other starts (Include_Initial_Parameters = 0)" : "");
+  }
+
   std::vector<std::string> parameterTable() const {
     std::vector<std::string> headings{"least", "median", "greatest", "% of range"};
-    const bool showsNear = near_.size() > 1 && !isSameEachTime();
-    if (showsNear) headings.push_back(fmt::format("% ({} least)", near_.size()));
-    std::vector<std::vector<double>> rows;
-    for (std::size_t k = 0; k < space_.size(); ++k) {
-      std::vector<double> values;
-      for (const Repetition* repetition : ended_) values.push_back(toModelScale(space_, k, repetition->best[k]));
-      const Spread spread = spreadOf(std::move(values));
-      rows.push_back({spread.least, spread.median, spread.greatest, 100.0 * rangeShare(ended_, space_, k)});
-      if (showsNear) rows.back().push_back(100.0 * rangeShare(near_, space_, k));
+    std::vector<std::vector<double>> rows = parameterSpreads(ended_, space_);
+    if (near_.size() > 1 && !isSameEachTime()) {
+      headings.push_back(fmt::format("% ({} least)", near_.size()));
+      for (std::size_t k = 0; k < rows.size(); ++k) rows[k].push_back(100.0 * rangeShare(near_, space_, k));
     }
     return formatTable("Parameters of the best sets", headings, space_.names, rows);
   }
 
   std::string otherMinimaText() const {
-    std::string text = fmt::format(
-        "The search has not found the same minimum each time: {} of {} repetitions ended within {:g} % of the least "
-        "value",
-        near_.size(), ended_.size(), 100.0 * kNearlyEqualShare);
-    if (values_.least > 0.0) {
-      text += fmt::format(", and the worst {:.3g} % above it", 100.0 * (values_.greatest / values_.least - 1.0));
+    std::string text =
+        fmt::format("The search has not found the same minimum each time: {} of {} repetitions ended within {} value",
+                    near_.size(), ended_.size(), nearly_.text());
+    const double above = values_.greatest - values_.least;
+    if (nearly_.isOfLeast && values_.least > 0.0) {
+      text += fmt::format(", and the worst {:.3g} % above it", 100.0 * above / values_.least);
+    } else {
+      text += fmt::format(", and the worst {:.3g} above it", above);
     }
     text += near_.size() == 1 ? ". As no other came near it, there may well be better values: "
                               : ". For a single search to find it more often: ";
@@ -141,15 +176,20 @@ class SpreadText final {
   }
 
   std::vector<const Repetition*> ended_;
-  std::vector<const Repetition*> near_;  ///< those that ended within kNearlyEqualShare of the least value
+  std::vector<const Repetition*> near_;  ///< those whose values count as equal to the least
   const SearchSpace& space_;
   Spread values_;
+  NearlyEqual nearly_;
+  std::size_t improved_ = 0;  ///< of those that have ended
 };
 
 }  // namespace
 
 std::vector<std::string> repetitionLines(std::span<const Repetition> repetitions, const SearchSpace& space,
-                                         std::int32_t planned) {
+                                         std::span<const std::string> objectives, std::int32_t planned) {
+  if (std::ranges::any_of(repetitions, [](const Repetition& one) { return one.front.has_value(); })) {
+    return repeatedFrontLines(repetitions, space, objectives, planned);
+  }
   std::vector<std::string> lines = tableLines(repetitions, planned);
   std::vector<const Repetition*> ended;
   for (const Repetition& repetition : repetitions) {

@@ -1,24 +1,22 @@
 #include "algorithms/searches/repetitions.h"
 
+#include <algorithm>
 #include <cmath>
 #include <cstdlib>
 
 #include <fmt/core.h>
 
+#include "algorithms/numbers/sample_summary.h"
+#include "algorithms/numbers/uniform_generator.h"
 #include "common/run_files.h"
 
 namespace mirevo {
-namespace {
-
-/// Of the generator of a run: seeds that differ by this have the same stream.
-constexpr std::int64_t kSeedPeriod = 259200;
-
-}  // namespace
+namespace {}  // namespace
 
 std::int32_t repetitionSeed(std::int32_t seed, std::int32_t index) {
   constexpr std::int64_t kLargest = std::numeric_limits<std::int32_t>::max();
   std::int64_t size = std::abs(std::int64_t{seed}) + index;
-  if (index > 0 && size > kLargest) size -= kSeedPeriod;
+  if (index > 0 && size > kLargest) size -= UniformGenerator::kSeedPeriod;
   return static_cast<std::int32_t>(seed < 0 ? -size : size);
 }
 
@@ -27,12 +25,34 @@ std::string seedsText(std::int32_t seed, std::int32_t count) {
   return fmt::format("seeds {} to {}", seed, repetitionSeed(seed, count - 1));
 }
 
+NearlyEqual nearlyEqual(double least, std::span<const double> starts) {
+  std::vector<double> known;
+  std::ranges::copy_if(starts, std::back_inserter(known), [](double value) { return std::isfinite(value); });
+  std::ranges::sort(known);
+  const double fall = known.empty() ? 0.0 : std::max(0.0, sortedQuantile(known, 0.5) - least);
+  const double ofLeast = kNearlyEqualShare * std::max(0.0, least);
+  const double ofFall = kNearlyEqualFall * fall;
+  return {std::max(ofLeast, ofFall), ofLeast >= ofFall};
+}
+
+std::string NearlyEqual::text() const {
+  return isOfLeast ? fmt::format("{:g} % of the least", 100.0 * kNearlyEqualShare)
+                   : fmt::format("{:.2g} of the least", tolerance);
+}
+
 DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchSpace& space) {
+  const bool hasFronts = std::ranges::any_of(repetitions, [](const Repetition& one) { return one.front.has_value(); });
   DataTable table{run_files::kRepetitions,
                   {"Repetitions of the search, each with a seed of its own: the best evaluation of each, its aggregate "
                    "and its parameters (model scale). Loops 0 and no termination: it had not ended"},
-                  {"Repetition", "Seed", "Evaluations", "Best_Evaluation", "Aggregate", "Loops"},
+                  {"Repetition", "Seed", "Evaluations", "Best_Evaluation", "Aggregate", "Loops", "Start_Aggregate"},
                   {}};
+  if (hasFronts) {
+    table.headLines.emplace_back(
+        "The best evaluation is that of its front that is nearest to the ideal point of the front of all. Hypervolume: "
+        "of its front, as a share of the box between that point and the reference point");
+    table.columns.emplace_back("Hypervolume");
+  }
   table.columns.insert(table.columns.end(), space.names.begin(), space.names.end());
   table.columns.emplace_back("Termination");
   std::int64_t number = 0;
@@ -43,7 +63,9 @@ DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchS
            std::int64_t{repetition.evaluations},
            std::int64_t{repetition.bestEvaluation},
            repetition.aggregate,
-           std::int64_t{repetition.loops}};
+           std::int64_t{repetition.loops},
+           repetition.startAggregate};
+    if (hasFronts) row.emplace_back(repetition.front ? repetition.front->hypervolume : 0.0);
     for (std::size_t k = 0; k < space.size(); ++k) {
       row.emplace_back(repetition.best.empty() ? std::numeric_limits<double>::quiet_NaN()
                                                : toModelScale(space, k, repetition.best[k]));

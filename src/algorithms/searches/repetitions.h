@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <limits>
+#include <optional>
 #include <span>
 #include <string>
 #include <vector>
@@ -36,7 +37,18 @@ std::int32_t repetitionSeed(std::int32_t seed, std::int32_t index);
 /// "seeds 3 to 7", "seed 3"
 std::string seedsText(std::int32_t seed, std::int32_t count);
 
-/// A repetition as far as it has come.
+/// The front of a repetition, beside that of all of them together.
+struct RepetitionFront {
+  double hypervolume = 0.0;             ///< on the scale of the front of all
+  std::size_t size = 0;                 ///< sets
+  std::size_t sharedSize = 0;           ///< of them on the front of all
+  std::vector<double> least = {};       ///< of each objective; empty without a front
+  std::vector<double> compromise = {};  ///< the objectives of its best set; likewise
+  double hypervolumeOfAll = 0.0;        ///< of the front of all
+};
+
+/// A repetition as far as it has come. The best set of a search for a front is the set of its front that is nearest to
+/// the ideal point of the front of all repetitions, on the scale of that.
 struct Repetition {
   std::int32_t seed = 0;
   int evaluations = 0;                                          ///< whose results it has
@@ -45,6 +57,10 @@ struct Repetition {
   ParameterSet best = {};                                       ///< search scale; empty without a best one
   int loops = 0;                                                ///< 0 until it has ended
   std::string termination = {};                                 ///< empty until it has ended
+  /// The least of the sets that it evaluated before it proposed any; NaN if none of them has succeeded.
+  double startAggregate = std::numeric_limits<double>::quiet_NaN();
+  ParameterSet start = {};                    ///< with it; search scale
+  std::optional<RepetitionFront> front = {};  ///< of a search that finds one
 };
 
 /// Successive evaluations of one repetition, all of these numbers.
@@ -54,19 +70,35 @@ struct RepetitionStretch {
   int last = 0;
 };
 
-/// The repetitions that have begun, for programs.
+/// The repetitions that have begun, for programs; all of them, or none, have a front.
 DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchSpace& space);
 /// Which evaluations are whose, for programs.
 DataTable repetitionRowTable(std::span<const RepetitionStretch> stretches);
 
-/// Best values that differ from the least by no more than this share of it count as equal to it.
+/// Best values that differ from the least by no more than this share of it count as equal to it,
 inline constexpr double kNearlyEqualShare = 0.01;
+/// or than this share of the way to it from where the repetitions began, where that is more: 1 % of a least value near
+/// 0 would be next to nothing, and of a negative one anything.
+inline constexpr double kNearlyEqualFall = 0.001;
+
+/// Which best values count as equal to the least.
+struct NearlyEqual {
+  double tolerance = 0.0;  ///< above the least
+  bool isOfLeast = true;   ///< it is kNearlyEqualShare of the least value, and not of the way to it
+
+  /// "1 % of the least", "0.0012 of the least"
+  std::string text() const;
+};
+/// `starts`: the values with which repetitions began, NaN where there is none; the way is from their median.
+NearlyEqual nearlyEqual(double least, std::span<const double> starts);
+
 /// A parameter is poorly identified if at nearly equal values it takes up more than this share of its range.
 inline constexpr double kWideShare = 0.1;
 
 /// The repetitions and their spread for people: a table, the spread of the best values and of each parameter of the
-/// best sets, and what follows from them. `planned`: how many repetitions there are to be.
+/// best sets, and what follows from them; of fronts that of their hypervolumes and compromises. `objectives`: the names
+/// of the objective functions. `planned`: how many repetitions there are to be.
 std::vector<std::string> repetitionLines(std::span<const Repetition> repetitions, const SearchSpace& space,
-                                         std::int32_t planned);
+                                         std::span<const std::string> objectives, std::int32_t planned);
 
 }  // namespace mirevo

@@ -33,11 +33,7 @@ struct SearchFacts {
   bool findsFront = false;                   ///< each objective function is an objective of its own; it needs several
   std::string_view modelChooses = "one";     ///< how many of the proposals for one run a surrogate model chooses
   std::string_view populationKeywords = {};  ///< "Population_Size"; empty if it has no population
-  std::string_view whyNotRepeated = {};      ///< why repetitions of it are refused; empty if they are not
 };
-
-/// Of searches for a front.
-inline constexpr std::string_view kFrontNotRepeated = "repetitions compare best values, and a front has none";
 
 /// A keyword whose value is small for the number of variable parameters: the search may end early.
 struct SearchAdvice {
@@ -106,6 +102,8 @@ class SearchMethod {
   virtual std::int64_t sampleSize(const InitialSampleSettings& /*sample*/, int /*budget*/) const {
     return populationSize();
   }
+  /// Why another seed would make no difference to it, and what would; empty if it does.
+  virtual std::string seedDoubt(const InitialSampleSettings& /*sample*/) const { return {}; }
   /// Most evaluations at a time, whatever the number of slots; 0: a limit is not known.
   virtual std::int64_t mostAtOnce() const { return 0; }
   /// Least number of evaluations in a loop.

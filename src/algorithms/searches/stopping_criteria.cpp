@@ -8,12 +8,6 @@
 #include "common/text.h"
 
 namespace mirevo {
-namespace {
-
-constexpr std::string_view kChangeKeyword = "Min_Change";
-
-}  // namespace
-
 const SettingSection<StoppingCriteria>& stoppingSection() {
   static const SettingSection<StoppingCriteria> section{
       {"OPTIMISATION_ALGORITHM/STOPPING_CRITERIA",
@@ -25,7 +19,7 @@ const SettingSection<StoppingCriteria>& stoppingSection() {
                                                     .unit = "model runs",
                                                     .meaning = "Budget of the search."}),
         setting<&StoppingCriteria::loopsConvergence>(
-            {.name = "No_Loops_Convergence",
+            {.name = kLoopsKeyword,
              .defaultValue = "10",
              .range = from(1),
              .refusal = "Error: No. of loops for evaluation of convergence criterion invalid",

@@ -22,6 +22,9 @@ struct StoppingCriteria {
 
 /// The keyword of `maxEvaluations`.
 inline constexpr std::string_view kBudgetKeyword = "Max_No_Evaluations";
+/// Those of `loopsConvergence` and `minChange`.
+inline constexpr std::string_view kLoopsKeyword = "No_Loops_Convergence";
+inline constexpr std::string_view kChangeKeyword = "Min_Change";
 /// The keyword of `minPopulationRange`.
 inline constexpr std::string_view kRangeKeyword = "Min_Population_Range";
 /// Why a search stops that has used its budget up.

@@ -290,13 +290,17 @@ export interface Repetition {
   best: number; // evaluation
   aggregate: Maybe;
   loops: number;
-  parameters: Maybe[]; // of its best set
+  start: Maybe; // the least aggregate with which it began
+  hypervolume?: Maybe; // of its front, on the scale of that of all
+  parameters: Maybe[]; // of its best set; of a front, of its compromise
   termination: string;
 }
 
 export interface Repetitions {
   parameters: string[];
   all: Repetition[];
+  tolerance: number; // above the least aggregate: as good as it
+  within: string; // that tolerance in words, "1 % of the least"
   stretches: [number, number, number][]; // repetition, first and last of successive evaluations of it
 }
 

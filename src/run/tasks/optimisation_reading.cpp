@@ -134,7 +134,7 @@ void OptimisationTask::read(const TaskReading& reading) {
     section.warn(kSurrogateKeyword, "neither 0 nor 1, no search will be run");
   }
   readMethod(reading, section);
-  requireRepetitions(repetitions, method->facts(), section);
+  warnOfOrder(repetitions, section);
 
   const SetupSection sample = section.open(nameInside(initialSampleSection().row));
   InitialSampleSection filled{initialSample, randomSeed};
@@ -155,6 +155,7 @@ void OptimisationTask::read(const TaskReading& reading) {
                                                        static_cast<int>(initialSample.generation)));
   }
   readEarlierResults(reading, sample);
+  requireRepetitions(repetitions, *method, initialSample, section);
   reading.requireScales(method->evaluatesSample(initialSample));
 
   const SetupSection stops = section.open(nameInside(stoppingSection().row));
@@ -298,8 +299,23 @@ void OptimisationTask::requireResiduals(const TaskReading& reading, const SetupS
 
 void OptimisationTask::warnOfOneLoop(const SetupSection& section) const {
   // Then a value is compared with itself.
-  if (method->populationSize() == 0 || stopping.loopsConvergence != 1 || !(stopping.minChange > 0.0)) return;
-  section.warn("No_Loops_Convergence", "with 1 the search ends after its first loop, use at least 2");
+  if (method->populationSize() == 0 || method->facts().findsFront || stopping.loopsConvergence != 1 ||
+      !(stopping.minChange > 0.0))
+    return;
+  section.warn(kLoopsKeyword, "with 1 the search ends after its first loop, use at least 2");
+}
+
+/// Of a search whose end is another one, values that a search by one objective would heed.
+void OptimisationTask::warnOfUnusedChange(const SetupSection& section) const {
+  if (!method->facts().findsFront || !(stopping.minChange > 0.0)) return;
+  const double loops = stopping.maxEvaluations / std::max(1.0, method->evaluationsPerLoop());
+  if (stopping.loopsConvergence > loops) return;  // a way of saying never
+  for (const std::string_view keyword : {kLoopsKeyword, kChangeKeyword}) {
+    if (!section.isWritten(keyword)) continue;
+    section.warn(keyword, fmt::format("has no effect: {} ends with its budget, or by the keywords "
+                                      "Hypervolume_Evaluations and Hypervolume_Change",
+                                      method->facts().name.name));
+  }
 }
 
 void OptimisationTask::readStopping(const SetupSection& section, std::size_t variableCount) {
@@ -311,6 +327,7 @@ void OptimisationTask::readStopping(const SetupSection& section, std::size_t var
   section.check(bound);
   requireRepeatedBudget(repetitions, stopping, section);
   warnOfOneLoop(section);
+  warnOfUnusedChange(section);
   if (section.isWritten(kRangeKeyword) && (!method->testsPopulationRange() || method->facts().findsFront)) {
     section.warn(kRangeKeyword,
                  fmt::format("has no effect: {} does not test the range of a population", method->facts().longName));

@@ -7,6 +7,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/numbers/lapack_functions.h"
+#include "algorithms/pareto/front_scale.h"
 #include "common/text.h"
 #include "measures/statistics.h"
 #include "run/tasks/analysis_names.h"
@@ -209,14 +210,17 @@ void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& 
   }
 }
 
-SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator, std::int32_t seed,
-                                       const PeriodicStep& step) {
+SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator, std::size_t index,
+                                       std::int32_t seed, const PeriodicStep& step) {
   UniformGenerator random(seed);
   SearchProblem problem = problemOf(context.space, context.feasibility, evaluator, random);
   std::optional<ProposalSelector> selector;
   if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds, problem.feasibility);
-  if (fitting_) problem.residuals = &fitting_->problem();
-  if (front_) problem.pareto = &front_->problem();
+  if (method->facts().usesResiduals) {
+    if (!fittings_[index]) fittings_[index] = std::make_unique<ResidualFitting>(context);
+    problem.residuals = &fittings_[index]->problem();
+  }
+  if (front_) problem.pareto = repeated_ ? &repeated_->front(index) : &front_->problem();
   return method->run(std::move(problem), step);
 }
 
@@ -226,27 +230,60 @@ SearchSummary OptimisationTask::searchAll(const TaskContext& context) {
   }
   if (repetitions.count > 1) {
     repeated_.emplace(repetitions, randomSeed);
+    if (front_) repeated_->findFronts(front_->problem().archive);
     return repeated_->run(
         context,
-        [&](Evaluator& evaluator, std::int32_t seed, const PeriodicStep& step) {
-          return search(context, evaluator, seed, step);
+        [&](Evaluator& evaluator, std::size_t index, std::int32_t seed, const PeriodicStep& step) {
+          return search(context, evaluator, index, seed, step);
         },
-        [&](const SearchSummary& summary, const BestCourse& course) { logEnd(context, summary, course); });
+        [&](std::size_t index, const SearchSummary& summary, const BestCourse& course) {
+          const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
+          logEnd(context, summary,
+                 front_ ? frontCourseLines(repeated_->front(index).archive, referencePoint(), isBudgetUsed, true)
+                        : courseLines(course, isBudgetUsed, true));
+          dropFittings();
+        });
   }
   WatchedEvaluator evaluator(context.evaluator);
   SearchSummary summary =
-      search(context, evaluator, randomSeed, [&context](std::string_view line) { context.log.reportLine(line); });
+      search(context, evaluator, 0, randomSeed, [&context](std::string_view line) { context.log.reportLine(line); });
   context.log.line("");
-  logEnd(context, summary, evaluator.course());
+  const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
+  logEnd(context, summary, front_ ? front_->courseLines(isBudgetUsed) : courseLines(evaluator.course(), isBudgetUsed));
   return summary;
+}
+
+/// That of the best repetition of those that have ended; nullptr of a search without.
+const ResidualFitting* OptimisationTask::bestFitting() const {
+  return fittings_.empty() ? nullptr : fittings_[repeated_ ? repeated_->bestEnded() : 0].get();
+}
+
+/// The same, or another one if that has no derivatives; nullptr if none has.
+const ResidualFitting* OptimisationTask::fittingWithDerivatives() const {
+  const ResidualFitting* const best = bestFitting();
+  if (best != nullptr && best->hasDerivatives()) return best;
+  const auto found = std::ranges::find_if(fittings_, [](const auto& one) { return one && one->hasDerivatives(); });
+  return found == fittings_.end() ? nullptr : found->get();
+}
+
+/// Each may hold many derivatives.
+void OptimisationTask::dropFittings() {
+  for (std::size_t i = 0; i < fittings_.size(); ++i) {
+    if (repeated_->hasEnded(i) && i != repeated_->bestEnded()) fittings_[i].reset();
+  }
+}
+
+std::span<const double> OptimisationTask::referencePoint() const {
+  const ParetoSettings* const pareto = method->paretoSettings();
+  return pareto == nullptr ? std::span<const double>() : std::span<const double>(pareto->referencePoint);
 }
 
 /// Why a search has ended, and what is to be said of its course.
 void OptimisationTask::logEnd(const TaskContext& context, const SearchSummary& summary,
-                              const BestCourse& course) const {
+                              const std::vector<std::string>& course) const {
   for (const std::string& note : summary.notes) context.log.line(note);
   context.log.line(summary.terminationMessage);
-  for (const std::string& line : linesOfCourse(course, summary.terminationMessage)) context.log.line(line);
+  for (const std::string& line : course) context.log.line(line);
   if (summary.replacedCount > 0) {
     context.log.line(fmt::format(
         "Proposed points that cannot be run (a constraint is violated, or an equation has no finite value) and were "
@@ -260,20 +297,21 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
   if (surrogateUse != SurrogateUse::no && surrogateUse != SurrogateUse::yes) return {std::string(kEndOfTask)};
 
   if (method->facts().usesResiduals) {
-    fitting_ = std::make_unique<ResidualFitting>(context);
-    if (const auto text = fitting_->otherMeasuresText(context)) context.log.warning(*text);
+    fittings_.resize(static_cast<std::size_t>(repetitions.count));
+    fittings_.front() = std::make_unique<ResidualFitting>(context);
+    if (const auto text = fittings_.front()->otherMeasuresText(context)) context.log.warning(*text);
   }
   if (const ParetoSettings* const pareto = method->paretoSettings()) {
     front_ = std::make_unique<FrontFinding>(*pareto);
     if (keepsFrontSeries_) {
       logRoomOfSimulatedValues(context, facts().resultFiles.simulatedValues,
-                               static_cast<std::size_t>(stopping.maxEvaluations));
+                               static_cast<std::size_t>(plannedEvaluations()));
     }
   }
   SearchSummary summary = searchAll(context);
   TaskOutcome outcome{summary.terminationMessage};
   if (repeated_) {
-    repeated_->addResults(context.space, outcome);
+    repeated_->addResults(context, referencePoint(), outcome);
     for (const std::string& line : outcome.report) context.log.reportLine(line);
     context.log.line("");
   }
@@ -282,14 +320,10 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
   if (suggested != nullptr) summary.finalRunOf = suggested->number;
   if (context.searchEnded) context.searchEnded(summary);
   logBestSet(context, summary.best, summary.bestResult);
-  if (fitting_) {
-    fitting_->addCovariance(context, outcome);
-    logReport(context, outcome.report);
-  }
-  if (front_) {
-    front_->addFront(context, summary.bestResult.number, outcome);
-    logReport(context, outcome.report);
-  }
+  const std::size_t logged = outcome.report.size();  // what there is of repetitions
+  if (const ResidualFitting* const fitting = bestFitting()) fitting->addCovariance(context, outcome);
+  if (front_) front_->addFront(context, summary.bestResult.number, outcome);
+  if (outcome.report.size() > logged) logReport(context, std::span(outcome.report).subspan(logged));
   context.log.line("");
   context.log.line(suggested == nullptr ? "Final model run with the best parameter set:"
                                         : fmt::format("Final model run with the suggested compromise, evaluation {}:",
@@ -299,36 +333,28 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
   return outcome;
 }
 
-std::vector<std::string> OptimisationTask::linesOfCourse(const BestCourse& course, std::string_view message) const {
-  const bool isBudgetUsed = message == kBudgetUsedMessage;
-  return front_ ? front_->courseLines(isBudgetUsed) : courseLines(course, isBudgetUsed);
-}
-
 std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext& context,
                                                                const UnfinishedBatch& made) const {
-  if (repeated_) {
-    TaskOutcome outcome{std::string(kEndOfTask)};
-    RepeatedSearch all = *repeated_;
-    all.takeUnfinished(context, made);
-    all.addResults(context.space, outcome);
-    return outcome;
-  }
-  if (front_ && front_->hasFront()) {
-    TaskOutcome outcome{std::string(kEndOfTask)};
-    front_->addFront(context, 0, outcome);
-    return outcome;
-  }
-  if (!fitting_ || !fitting_->hasDerivatives()) return std::nullopt;
+  const ResidualFitting* const fitting = fittingWithDerivatives();
+  if (!repeated_ && fitting == nullptr && !(front_ && front_->hasFront())) return std::nullopt;
   TaskOutcome outcome{std::string(kEndOfTask)};
-  fitting_->addCovariance(context, outcome);
+  std::optional<FrontFinding> front;
+  if (front_) front.emplace(*front_);
+  if (repeated_) {
+    RepeatedSearch all = *repeated_;
+    all.takeUnfinished(context, made, front ? &front->problem().archive : nullptr);
+    all.addResults(context, referencePoint(), outcome);
+  }
+  if (fitting != nullptr) fitting->addCovariance(context, outcome);
+  if (front) front->addFront(context, 0, outcome);
   return outcome;
 }
 
 std::optional<int> OptimisationTask::evaluationsInBatches() const {
   if (repeated_) return repeated_->evaluationCount();
   if (front_) return front_->evaluationCount();
-  if (!fitting_ || !fitting_->hasDerivatives()) return 0;
-  return fitting_->problem().evaluationCount;
+  const ResidualFitting* const fitting = fittingWithDerivatives();
+  return fitting == nullptr ? 0 : fitting->problem().evaluationCount;
 }
 
 TaskReport OptimisationTask::report() const {

@@ -69,24 +69,32 @@ class OptimisationTask final : public Task {
   void readMethod(const TaskReading& reading, const SetupSection& section);
   void readStopping(const SetupSection& section, std::size_t variableCount);
   void warnOfOneLoop(const SetupSection& section) const;
+  void warnOfUnusedChange(const SetupSection& section) const;
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
   std::vector<ParameterSet> givenSample(const SearchSpace& space) const;
   std::vector<ParameterSet> givenSets(const SearchSpace& space) const;
   SearchProblem problemOf(const SearchSpace& space, const Feasibility& feasibility, Evaluator& evaluator,
                           UniformGenerator& random) const;
-  SearchSummary search(const TaskContext& context, Evaluator& evaluator, std::int32_t seed, const PeriodicStep& step);
+  /// The search with this 0-based index of its repetitions.
+  SearchSummary search(const TaskContext& context, Evaluator& evaluator, std::size_t index, std::int32_t seed,
+                       const PeriodicStep& step);
   SearchSummary searchAll(const TaskContext& context);
-  void logEnd(const TaskContext& context, const SearchSummary& summary, const BestCourse& course) const;
+  void logEnd(const TaskContext& context, const SearchSummary& summary, const std::vector<std::string>& course) const;
+  const ResidualFitting* bestFitting() const;
+  const ResidualFitting* fittingWithDerivatives() const;
+  void dropFittings();
   void requireResiduals(const TaskReading& reading, const SetupSection& section) const;
-  std::vector<std::string> linesOfCourse(const BestCourse& course, std::string_view message) const;
+  std::span<const double> referencePoint() const;
 
   std::optional<std::string> sampleText_;         ///< of a sample file, which is read once
   std::vector<std::vector<double>> givenValues_;  ///< those of a file, one entry per model parameter
   EarlierSets earlierSets_;                       ///< of an earlier run
   std::vector<EarlierSearch> earlierSearches_;
-  std::unique_ptr<ResidualFitting> fitting_;  ///< of a search by residuals, once it runs
-  std::optional<RepeatedSearch> repeated_;    ///< once it runs
-  std::unique_ptr<FrontFinding> front_;       ///< of a search for a front, once it runs
+  /// Of a search by residuals, once it runs: one for each repetition, but null for those that have ended without
+  /// finding the best.
+  std::vector<std::unique_ptr<ResidualFitting>> fittings_;
+  std::optional<RepeatedSearch> repeated_;  ///< once it runs
+  std::unique_ptr<FrontFinding> front_;     ///< of a search for a front, once it runs; of repetitions that of all
   bool keepsFrontSeries_ = false;
 };
 

@@ -28,16 +28,19 @@ std::span<const CodeName> repetitionOrderNames() {
   return kOrders;
 }
 
-void requireRepetitions(const RepetitionSettings& settings, const SearchFacts& facts, const SetupSection& section) {
-  if (settings.count == 1) {
-    if (section.isWritten(kRepetitionOrderKeyword)) {
-      section.warn(kRepetitionOrderKeyword, fmt::format("has no effect with {} = 1", kRepetitionsKeyword));
-    }
-    return;
-  }
-  if (facts.whyNotRepeated.empty()) return;
+void warnOfOrder(const RepetitionSettings& settings, const SetupSection& section) {
+  if (settings.count > 1 || !section.isWritten(kRepetitionOrderKeyword)) return;
+  section.warn(kRepetitionOrderKeyword, fmt::format("has no effect with {} = 1", kRepetitionsKeyword));
+}
+
+void requireRepetitions(const RepetitionSettings& settings, const SearchMethod& method,
+                        const InitialSampleSettings& sample, const SetupSection& section) {
+  if (settings.count == 1) return;
+  const std::string doubt = method.seedDoubt(sample);
+  if (doubt.empty()) return;
   section.refuse("Error: No. of repetitions of the search invalid", kRepetitionsKeyword,
-                 fmt::format("expected 1 for {}, found {}: {}", facts.name.name, settings.count, facts.whyNotRepeated));
+                 fmt::format("expected 1, found {}: the repetitions of {} would be the same, as {}", settings.count,
+                             method.facts().name.name, doubt));
 }
 
 void requireRepeatedBudget(const RepetitionSettings& settings, const StoppingCriteria& stopping,
@@ -91,7 +94,10 @@ class RepeatedSearch::Watch final : public Evaluator {
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override {
     noteHandedOut(sets.size());
     std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets(sets, mode);
-    for (std::size_t i = 0; i < results.size(); ++i) take(sets[i], results[i]);
+    for (std::size_t i = 0; i < results.size(); ++i) {
+      if (!all_.settings_.areSideBySide()) all_.receive(sets[i], results[i]);
+      take(sets[i], results[i]);
+    }
     if (!isSettled_) sample_.assign(sets.begin(), sets.end());
     return results;
   }
@@ -102,6 +108,7 @@ class RepeatedSearch::Watch final : public Evaluator {
   }
   EvaluationResult awaitFirst() override {
     EvaluationResult result = evaluator_.awaitFirst();
+    if (!all_.settings_.areSideBySide()) all_.receive(submitted_.front(), result);
     take(submitted_.front(), result);
     submitted_.pop_front();
     return result;
@@ -122,6 +129,8 @@ class RepeatedSearch::Watch final : public Evaluator {
     course().clear();
     repetition() = {.seed = repetition().seed};
     for (std::size_t i = 0; i < std::min(sample.size(), sample_.size()); ++i) take(sample_[i], sample[i]);
+    repetition().startAggregate = repetition().aggregate;
+    repetition().start = repetition().best;
     sample_ = {};
   }
 
@@ -168,6 +177,7 @@ class RepeatedSearch::Receipt final : public Evaluator {
   }
   EvaluationResult awaitFirst() override {
     EvaluationResult result = evaluator_.awaitFirst();
+    all_.receive(submitted_.front(), result);
     all_.waiting_[result.number] = {std::move(submitted_.front()), result};
     submitted_.pop_front();
     return result;
@@ -181,6 +191,16 @@ class RepeatedSearch::Receipt final : public Evaluator {
   std::deque<ParameterSet> submitted_;  ///< without a result
 };
 
+void RepeatedSearch::findFronts(ParetoArchive& ofAll) {
+  fronts_.emplace(static_cast<std::size_t>(settings_.count));
+  frontOfAll_ = &ofAll;
+}
+
+/// Results come in the order of their numbers, whichever repetition takes them.
+void RepeatedSearch::receive(const ParameterSet& set, const EvaluationResult& result) {
+  if (frontOfAll_ != nullptr) addToArchive(*frontOfAll_, set, result);
+}
+
 void RepeatedSearch::note(std::size_t index, const ParameterSet& set, const EvaluationResult& result) {
   Repetition& own = repetitions_[index];
   ++own.evaluations;
@@ -190,8 +210,11 @@ void RepeatedSearch::note(std::size_t index, const ParameterSet& set, const Eval
   own.best = set;
 }
 
-void RepeatedSearch::takeUnfinished(const TaskContext& context, const UnfinishedBatch& made) {
+void RepeatedSearch::takeUnfinished(const TaskContext& context, const UnfinishedBatch& made, ParetoArchive* ofAll) {
+  frontOfAll_ = ofAll;
   for (std::size_t i = 0; i < made.results.size(); ++i) {
+    if (made.results[i].number > handedOut_) continue;  // of the final model run
+    receive(made.sets[i], made.results[i]);
     waiting_[made.results[i].number] = {made.sets[i], made.results[i]};
   }
   for (auto& [number, evaluated] : waiting_) {
@@ -202,7 +225,9 @@ void RepeatedSearch::takeUnfinished(const TaskContext& context, const Unfinished
     const auto stretch = std::ranges::find_if(stretches_, isIts);
     if (stretch == stretches_.end()) continue;
     if (result.ok() && context.aggregate) result.aggregate = context.aggregate(result.objectiveValues);
-    note(static_cast<std::size_t>(stretch->repetition) - 1, set, result);
+    const auto index = static_cast<std::size_t>(stretch->repetition) - 1;
+    note(index, set, result);
+    if (fronts_) addToArchive(fronts_->problem(index).archive, set, result);
   }
   waiting_.clear();
 }
@@ -217,7 +242,8 @@ SearchSummary RepeatedSearch::run(const TaskContext& context, const Search& sear
       const std::int32_t seed = repetitionSeed(seed_, static_cast<std::int32_t>(i));
       repetitions_.push_back({.seed = seed});
       Watch watch(*this, i, evaluator, context);
-      return search(watch, seed, [&](std::string_view line) { step(fmt::format("Repetition {}: {}", i + 1, line)); });
+      return search(watch, i, seed,
+                    [&](std::string_view line) { step(fmt::format("Repetition {}: {}", i + 1, line)); });
     });
   }
   const PeriodicStep report = [&context](std::string_view line) { context.log.reportLine(line); };
@@ -226,7 +252,7 @@ SearchSummary RepeatedSearch::run(const TaskContext& context, const Search& sear
                                  repetitions_[i].seed,
                                  countText(static_cast<std::size_t>(repetitions_[i].evaluations), "evaluation")));
     end(i, summary);
-    ended(summary, courses_[i]);
+    ended(i, summary, courses_[i]);
     context.log.line("");
   };
   if (settings_.areSideBySide()) {
@@ -250,16 +276,28 @@ void RepeatedSearch::end(std::size_t index, const SearchSummary& summary) {
     own.best = summary.best;
   }
   const bool isFirst = best_.best.empty();
+  const double before = best_.bestResult.aggregate;
+  const double now = summary.bestResult.aggregate;
+  // Side by side a later one may have ended before.
   const bool isBetter =
-      summary.bestResult.ok() && (!best_.bestResult.ok() || summary.bestResult.aggregate < best_.bestResult.aggregate);
-  if (isFirst || isBetter) best_ = summary;
+      summary.bestResult.ok() && (!best_.bestResult.ok() || now < before || (now == before && index < bestEnded_));
+  if (!isFirst && !isBetter) return;
+  best_ = summary;
+  bestEnded_ = index;
 }
 
-void RepeatedSearch::addResults(const SearchSpace& space, TaskOutcome& outcome) const {
-  for (std::string& line : repetitionLines(repetitions_, space, settings_.count)) {
+bool RepeatedSearch::hasEnded(std::size_t index) const {
+  return index < repetitions_.size() && !repetitions_[index].termination.empty();
+}
+
+void RepeatedSearch::addResults(const TaskContext& context, std::span<const double> reference, TaskOutcome& outcome) {
+  if (fronts_) fronts_->describe(*frontOfAll_, reference, context.aggregate, repetitions_);
+  std::vector<std::string> objectives;
+  for (const ObjectiveFunction& objective : context.objectives) objectives.push_back(objective.name);
+  for (std::string& line : repetitionLines(repetitions_, context.space, objectives, settings_.count)) {
     outcome.report.push_back(std::move(line));
   }
-  outcome.tables.push_back(repetitionTable(repetitions_, space));
+  outcome.tables.push_back(repetitionTable(repetitions_, context.space));
   outcome.tables.push_back(repetitionRowTable(stretches_));
 }
 

@@ -17,6 +17,7 @@ class ResidualFitting final {
   explicit ResidualFitting(const TaskContext& context);
 
   ResidualProblem& problem() { return problem_; }
+  const ResidualProblem& problem() const { return problem_; }
 
   /// Adds lines and tables to the outcome. Without a fit that has derivatives it adds the reason alone.
   void addCovariance(const TaskContext& context, TaskOutcome& outcome) const;

@@ -25,9 +25,11 @@ class WatchedEvaluator final : public Evaluator {
     return result;
   }
   UnfinishedBatch takeUnfinished() override { return evaluator_.takeUnfinished(); }
-  /// The aggregates before the scale was known are not comparable with the others.
+  /// The aggregates before the scale was known are not comparable with the others. A search that goes on from an
+  /// earlier one has it already.
   void settleAggregates(std::span<EvaluationResult> sample) override {
     evaluator_.settleAggregates(sample);
+    if (course_.evaluationCount() > std::ssize(sample)) return;
     course_.clear();
     for (const EvaluationResult& result : sample) course_.add(result.aggregate);
   }

@@ -29,9 +29,9 @@ BestCourse stepsOf(double quarter, double half, double end) {
   return course;
 }
 
-std::string textOf(const BestCourse& course, bool isBudgetUsed) {
+std::string textOf(const BestCourse& course, bool isBudgetUsed, bool isRepetition = false) {
   std::string text;
-  for (const std::string& line : courseLines(course, isBudgetUsed)) text += line + "\n";
+  for (const std::string& line : courseLines(course, isBudgetUsed, isRepetition)) text += line + "\n";
   return text;
 }
 
@@ -64,6 +64,19 @@ TEST(BestCourse, IsToldByWhatAnotherRunCouldBring) {
               AllOf(HasSubstr("none of the first half succeeded"), Not(HasSubstr("more evaluations"))));
   EXPECT_THAT(courseLines(courseOf(std::vector<double>(40, kFailedRunValue)), true), IsEmpty());
   EXPECT_THAT(courseLines(courseOf({3.0, 2.0, 1.0}), true), IsEmpty());
+}
+
+TEST(BestCourse, OfARepetitionIsCountedForItselfAndHeldAgainstTheOthers) {
+  for (const bool isBudgetUsed : {true, false}) {
+    EXPECT_THAT(textOf(stepsOf(8.0, 4.0, 4.0), isBudgetUsed, true),
+                AllOf(HasSubstr("found by its evaluation 11 of 40"), HasSubstr("the other repetitions can tell"),
+                      Not(HasSubstr("Random_Seed"))))
+        << isBudgetUsed;
+  }
+}
+
+TEST(BestCourse, APositiveValueIsNotExpectedToFallBelowZero) {
+  EXPECT_THAT(textOf(stepsOf(8.0, 4.0, 1.0), true), HasSubstr("about 0. Such"));
 }
 
 TEST(BestCourse, BeginsAnewWithAnotherScale) {

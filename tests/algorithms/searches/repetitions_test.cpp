@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/searches/repeated_fronts.h"
 #include "matchers.h"
 
 namespace mirevo {
@@ -40,19 +41,29 @@ SearchSpace repeatedSpace() {
   return space;
 }
 
-/// With evaluations 10, 20, ... as the best ones.
-std::vector<Repetition> repetitionsOf(const std::vector<std::pair<double, ParameterSet>>& best) {
+/// With evaluations 10, 20, ... as the best ones, which began with `start`.
+std::vector<Repetition> repetitionsOf(const std::vector<std::pair<double, ParameterSet>>& best, double start = 5.0) {
   std::vector<Repetition> all;
   for (const auto& [aggregate, set] : best) {
     const auto number = static_cast<int>(all.size()) + 1;
-    all.push_back({number, 100, 10 * number, aggregate, set, 9, "Optimisation terminated: Population converged"});
+    all.push_back({number,
+                   100,
+                   10 * number,
+                   aggregate,
+                   set,
+                   9,
+                   "Optimisation terminated: Population converged",
+                   start,
+                   {4.0, 1.5}});
   }
   return all;
 }
 
 std::string spreadText(const std::vector<Repetition>& all) {
   std::string text;
-  for (const std::string& line : repetitionLines(all, repeatedSpace(), static_cast<std::int32_t>(all.size()))) {
+  const std::string objectives[] = {"low", "high"};
+  for (const std::string& line :
+       repetitionLines(all, repeatedSpace(), objectives, static_cast<std::int32_t>(all.size()))) {
     text += line + "\n";
   }
   return text;
@@ -71,14 +82,104 @@ TEST(Repetitions, TheirSpreadIsToldInWords) {
                               "value, and the worst 50 % above it. For a single search"));
   EXPECT_THAT(text, EndsWith("identifies them poorly: a (35 %)\n"));
 
-  const std::string same = spreadText(repetitionsOf({{-2.0, {1.0, 0.0}}, {-1.99, {1.5, 0.1}}}));
+  const std::string same = spreadText(repetitionsOf({{2.0, {1.0, 0.0}}, {2.01, {1.5, 0.1}}}));
   EXPECT_THAT(same, HasSubstr("2 of 2 repetitions ended within 1 %"));
   EXPECT_THAT(same, EndsWith("ended at nearly the same value, with every parameter within 10 % of its range\n"));
   EXPECT_THAT(same, Not(HasSubstr("same minimum each time")));
 
   const std::string apart = spreadText(repetitionsOf({{0.0, {1.0, 0.0}}, {0.1, {1.0, 0.1}}}));
-  EXPECT_THAT(apart, HasSubstr("1 of 2 repetitions ended within 1 % of the least value. As no other came near it"));
+  EXPECT_THAT(apart,
+              HasSubstr("1 of 2 repetitions ended within 0.005 of the least value, and the worst 0.1 above it. As "
+                        "no other came near it"));
   EXPECT_THAT(apart, Not(HasSubstr("poorly")));
+}
+
+TEST(Repetitions, WhatCountsAsEqualToTheLeastValueHoldsNearZeroAndBelowIt) {
+  const double none = std::numeric_limits<double>::quiet_NaN();
+  const struct {
+    double least;
+    std::vector<double> starts;
+    double tolerance;
+    const char* text;
+  } cases[] = {{2.0, {5.0, 9.0, 12.0}, 0.02, "1 % of the least"},       {2.0, {none, none}, 0.02, "1 % of the least"},
+               {0.001, {5.001, 9.0, 1.0}, 0.005, "0.005 of the least"}, {0.0, {4.0, 8.0}, 0.006, "0.006 of the least"},
+               {-12000.0, {-8000.0, none}, 4.0, "4 of the least"},      {-3.0, {-3.0, -3.0}, 0.0, "1 % of the least"}};
+  for (const auto& one : cases) {
+    const NearlyEqual nearly = nearlyEqual(one.least, one.starts);
+    EXPECT_NEAR(nearly.tolerance, one.tolerance, 1e-12);
+    EXPECT_EQ(nearly.text(), one.text);
+  }
+}
+
+TEST(Repetitions, ThatTheyHaveTheirStartInCommonIsNoMinimumThatAllHaveFound) {
+  std::vector<Repetition> all = repetitionsOf({{5.0, {4.0, 1.5}}, {5.0, {4.0, 1.5}}, {5.0, {3.0, 1.5}}});
+  EXPECT_THAT(
+      spreadText(all),
+      AllOf(HasSubstr("greatest 5\nNone of the 3 repetitions found anything better than the set that all of them "
+                      "began with, which says nothing of a minimum"),
+            HasSubstr("Include_Initial_Parameters = 0"), Not(HasSubstr("Whatever the seed"))));
+  all[1].start = {1.0, 1.0};
+  EXPECT_THAT(spreadText(all), HasSubstr("better than the sets that it began with"));
+  all[2].aggregate = 4.99;
+  EXPECT_THAT(spreadText(all), HasSubstr("\n2 of 3 repetitions found nothing better than what they began with\n"));
+}
+
+/// Two repetitions with fronts of two objectives, worked out by hand: (0, 1) and (1, 0), and (0.5, 0.5) with a set
+/// behind the first. The reference point is (1.1, 1.1) on the scale of all.
+TEST(Repetitions, TheirFrontsAreComparedOnTheScaleOfThatOfAll) {
+  RepeatedFronts fronts(3);
+  ParetoArchive ofAll;
+  const std::tuple<std::size_t, int, ParameterSet, std::vector<double>> sets[] = {{0, 1, {1.0, 0.0}, {0.0, 1.0}},
+                                                                                  {1, 2, {5.0, 0.0}, {0.1, 1.1}},
+                                                                                  {0, 3, {2.0, 0.0}, {1.0, 0.0}},
+                                                                                  {1, 4, {6.0, 0.4}, {0.5, 0.5}},
+                                                                                  {1, 5, {7.0, 0.4}, {0.5, 0.5}}};
+  EvaluationResult result;
+  for (const auto& [index, number, set, values] : sets) {
+    result.number = number;
+    result.objectiveValues = values;
+    addToArchive(fronts.problem(index).archive, set, result);
+    addToArchive(ofAll, set, result);
+  }
+  result.failure.emplace();
+  addToArchive(fronts.problem(2).archive, {9.0, 0.0}, result);
+  EXPECT_EQ(fronts.problem(2).archive.evaluationCount(), 1);
+  EXPECT_EQ(ofAll.members().size(), 3U);
+
+  std::vector<Repetition> all(3);
+  for (std::size_t i = 0; i < 3; ++i) all[i] = {static_cast<std::int32_t>(i) + 1, 3, 0, 0.0, {}, 7, "it was enough"};
+  const auto sum = [](std::span<const double> values) { return values[0] + 2.0 * values[1]; };
+  fronts.describe(ofAll, {}, sum, all);
+  constexpr double kBox = 1.21;
+  EXPECT_NEAR(all[0].front->hypervolume, 0.21 / kBox, 1e-12);
+  EXPECT_NEAR(all[1].front->hypervolume, (0.36 + 0.0) / kBox, 1e-12);
+  EXPECT_NEAR(all[1].front->hypervolumeOfAll, 0.46 / kBox, 1e-12);
+  EXPECT_EQ(all[1].front->size, 2U) << "with the set behind that of the other";
+  EXPECT_EQ(all[1].front->sharedSize, 1U);
+  EXPECT_EQ(all[0].bestEvaluation, 1) << "of equal distances the first";
+  EXPECT_EQ(all[1].bestEvaluation, 4);
+  EXPECT_EQ(all[1].aggregate, 1.5);
+  EXPECT_EQ(all[2].bestEvaluation, 0);
+  const std::string text = spreadText(all);
+  EXPECT_THAT(text, ::testing::ContainsRegex("\n +2 +2 +3 +2 +1 +0.297521 +No. 4  it was enough\n"));
+  EXPECT_THAT(text, ::testing::ContainsRegex("\n +3 +3 +3 +0 +0 +none +it was enough\n"));
+  EXPECT_THAT(text, HasSubstr("least 0.173554, median 0.235537, greatest 0.297521; of all 0.380165"));
+  EXPECT_THAT(text, ::testing::ContainsRegex("\n   high +0 +0.25 +0.5\n"));
+  EXPECT_THAT(text, ::testing::ContainsRegex("\n   high +0.5 +0.75 +1\n"));
+  EXPECT_THAT(text, ::testing::ContainsRegex("\n   a +1 +3.5 +6 +50\n"));
+  EXPECT_THAT(text,
+              HasSubstr("0 of 2 repetitions come within 1 % of the hypervolume of all, and the least is 54.3 % "));
+  EXPECT_THAT(dataTableText(repetitionTable(all, repeatedSpace())),
+              HasSubstr("\tLoops\tStart_Aggregate\tHypervolume\ta\tk\tTermination\n1\t1\t3\t1\t2\t7\tNaN\t0.17355"));
+
+  all[1].front->hypervolume = 0.0;
+  EXPECT_THAT(spreadText(all), HasSubstr("of all, and one lies behind the reference point altogether. For a single"));
+  fronts.describe(ofAll, std::vector<double>{2.0, 2.0}, sum, all);
+  EXPECT_NEAR(all[0].front->hypervolume, 3.0 / 4.0, 1e-12) << "up to the point that is given";
+  all[2].front.reset();
+  all.resize(2);
+  all[0].front->hypervolume = all[1].front->hypervolume = 0.9999 * all[0].front->hypervolumeOfAll;
+  EXPECT_THAT(spreadText(all), EndsWith("nearly the same front: each hypervolume is within 1 % of that of all\n"));
 }
 
 TEST(Repetitions, OneThatHasNotEndedOrHasNoResultHasItsRowAndNoShareInTheSpread) {
@@ -86,16 +187,17 @@ TEST(Repetitions, OneThatHasNotEndedOrHasNoResultHasItsRowAndNoShareInTheSpread)
   all[1].termination.clear();
   all[1].loops = 0;
   all[2] = {3, 12, 0, std::numeric_limits<double>::quiet_NaN(), {}, 4, "Optimisation terminated: it failed"};
-  const std::vector<std::string> lines = repetitionLines(all, repeatedSpace(), 5);
+  const std::vector<std::string> lines = repetitionLines(all, repeatedSpace(), {}, 5);
   ASSERT_EQ(lines.size(), 5U) << "one that has ended has no spread";
   EXPECT_EQ(lines[0], "The 3 of 5 repetitions of the search that had begun:");
   EXPECT_THAT(lines[3], EndsWith("  has not ended"));
   EXPECT_THAT(lines[4], ::testing::ContainsRegex("^ +3 +3 +12 +none +it failed$"));
   EXPECT_THAT(dataTableText(repetitionTable(all, repeatedSpace())),
-              EndsWith("Repetition\tSeed\tEvaluations\tBest_Evaluation\tAggregate\tLoops\ta\tk\tTermination\n"
-                       "1\t1\t100\t10\t2\t9\t1\t1\tOptimisation terminated: Population converged\n"
-                       "2\t2\t100\t20\t1\t0\t9\t2.718281828459045\t\n"
-                       "3\t3\t12\t0\tNaN\t4\tNaN\tNaN\tOptimisation terminated: it failed\n"));
+              EndsWith("Repetition\tSeed\tEvaluations\tBest_Evaluation\tAggregate\tLoops\tStart_Aggregate\ta\tk\t"
+                       "Termination\n"
+                       "1\t1\t100\t10\t2\t9\t5\t1\t1\tOptimisation terminated: Population converged\n"
+                       "2\t2\t100\t20\t1\t0\t5\t9\t2.718281828459045\t\n"
+                       "3\t3\t12\t0\tNaN\t4\tNaN\tNaN\tNaN\tOptimisation terminated: it failed\n"));
 }
 
 }  // namespace

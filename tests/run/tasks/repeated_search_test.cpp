@@ -1,9 +1,14 @@
 #include "run/tasks/repeated_search.h"
 
+#include <set>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "algorithms/function_evaluator.h"
+#include "algorithms/pareto/front_scale.h"
+#include "algorithms/searches/nsga_ii.h"
+#include "algorithms/searches/padds.h"
 #include "matchers.h"
 #include "run/tasks/optimisation_task.h"
 
@@ -19,6 +24,8 @@ class RepeatedSearches : public ::testing::Test {
     auto task = std::make_unique<OptimisationTask>();
     task->method = searchMethods().make(SetupValue(std::string(search)));
     task->method->setVariableCount(2);
+    if (auto* const nsga = dynamic_cast<NsgaIiMethod*>(task->method.get())) nsga->settings.populationSize = 12;
+    if (auto* const padds = dynamic_cast<PaddsMethod*>(task->method.get())) padds->settings.candidates = 2;
     task->surrogateUse = use;
     task->stopping = {.maxEvaluations = kRepeatedBudget, .minChange = 0.02};
     task->surrogate.neighbourhoodSize = 20;
@@ -31,6 +38,19 @@ class RepeatedSearches : public ::testing::Test {
       return resultOf((set[0] - 3.0) * (set[0] - 3.0) + 10.0 * (set[1] - set[0]) * (set[1] - set[0]));
     });
     return task.run({space_, parameters_, measures_, objectives_, *evaluator_, log_});
+  }
+  static std::vector<double> objectivesOf(const ParameterSet& set) {
+    return {(set[0] - 3.0) * (set[0] - 3.0) + (set[1] - 2.0) * (set[1] - 2.0),
+            (set[0] - 6.0) * (set[0] - 6.0) + (set[1] - 7.0) * (set[1] - 7.0)};
+  }
+  TaskOutcome runForFront(Task& task) {
+    evaluator_.emplace([](const ParameterSet& set) {
+      const std::vector<double> values = objectivesOf(set);
+      return EvaluationResult{.objectiveValues = values, .aggregate = values[0] + values[1]};
+    });
+    TaskContext context{space_, parameters_, measures_, objectives_, *evaluator_, log_};
+    context.aggregate = [](std::span<const double> values) { return values[0] + values[1]; };
+    return task.run(context);
   }
   /// Its best sets, one row each, without the numbers of their evaluations.
   static std::vector<std::vector<DataTable::Cell>> rowsOf(const TaskOutcome& outcome) {
@@ -51,7 +71,8 @@ class RepeatedSearches : public ::testing::Test {
 
 TEST_F(RepeatedSearches, EachFindsWhatARunWithItsSeedFindsInEitherOrder) {
   for (const CodeName& name : searchMethods().names()) {
-    if (!searchMethods().make(SetupValue(std::string(name.name)))->facts().whyNotRepeated.empty()) continue;
+    const auto method = searchMethods().make(SetupValue(std::string(name.name)));
+    if (method->facts().findsFront || method->facts().usesResiduals) continue;  // these results have neither
     for (const SurrogateUse use : {SurrogateUse::no, SurrogateUse::yes}) {
       SCOPED_TRACE(::testing::Message() << name.name << " " << static_cast<int>(use));
       const auto consecutive = taskOf(name.name, use, {3, RepetitionOrder::consecutive}, 5);
@@ -79,12 +100,73 @@ TEST_F(RepeatedSearches, EachFindsWhatARunWithItsSeedFindsInEitherOrder) {
         EXPECT_EQ(row[1], DataTable::Cell(std::int64_t{5 + i}));
         EXPECT_EQ(row[2], DataTable::Cell(std::int64_t{evaluator_->evaluationCount - 1}));
         EXPECT_THAT(evaluator_->batches.back(),
-                    ElementsAre(ElementsAre(std::get<double>(row[5]), std::get<double>(row[6]))));
+                    ElementsAre(ElementsAre(std::get<double>(row[6]), std::get<double>(row[7]))));
         if (std::get<double>(row[3]) >= least) continue;
         least = std::get<double>(row[3]);
         best = evaluator_->batches.back();
       }
       EXPECT_EQ(finalRun, best);
+    }
+  }
+}
+
+/// What a search for two objectives has found: the objectives of its front.
+std::set<std::vector<double>> frontIn(const TaskOutcome& outcome) {
+  std::set<std::vector<double>> front;
+  for (const DataTable& table : outcome.tables) {
+    if (table.file != run_files::kPareto) continue;
+    for (const auto& row : table.rows) {
+      if (std::get<std::int64_t>(row[1]) == 1) front.insert({std::get<double>(row[6]), std::get<double>(row[7])});
+    }
+  }
+  return front;
+}
+
+TEST_F(RepeatedSearches, TheFrontOfAllIsThatOfWhatRunsWithTheirSeedsFindInEitherOrder) {
+  objectives_.resize(2);
+  for (const char* const search : {"NSGA-II", "PADDS"}) {
+    SCOPED_TRACE(search);
+    std::vector<TaskOutcome> outcomes;
+    std::vector<std::vector<ParameterSet>> finalRuns;
+    for (const RepetitionOrder order : {RepetitionOrder::consecutive, RepetitionOrder::sideBySide}) {
+      const auto task = taskOf(search, SurrogateUse::no, {3, order}, 5);
+      outcomes.push_back(runForFront(*task));
+      finalRuns.push_back(evaluator_->batches.back());
+      EXPECT_EQ(evaluator_->evaluationCount, 3 * kRepeatedBudget + 1);
+    }
+    EXPECT_EQ(finalRuns[0], finalRuns[1]);
+    auto rows = outcomes[0].tables.at(0).rows;
+    auto others = outcomes[1].tables.at(0).rows;
+    for (auto* const of : {&rows, &others}) {
+      for (auto& row : *of) row.erase(row.begin() + 3);
+    }
+    EXPECT_EQ(rows, others);
+
+    ParetoArchive together;
+    double nearest = std::numeric_limits<double>::infinity();
+    for (std::int32_t i = 0; i < 3; ++i) {
+      const auto alone = taskOf(search, SurrogateUse::no, {}, 5 + i);
+      const auto front = frontIn(runForFront(*alone));
+      for (const std::vector<double>& values : front) together.add(0, {}, values);
+      const auto row = rows.at(static_cast<std::size_t>(i));
+      const std::vector<double> compromise = objectivesOf({std::get<double>(row[7]), std::get<double>(row[8])});
+      EXPECT_EQ(front.count(compromise), 1U);
+      EXPECT_EQ(std::get<double>(row[3]), compromise[0] + compromise[1]) << "its aggregate";
+    }
+    const std::vector<std::vector<double>> front = together.front();
+    const FrontScale scale(front);
+    std::vector<std::vector<double>> compromises;
+    for (const auto& row : rows) {
+      compromises.push_back(objectivesOf({std::get<double>(row[7]), std::get<double>(row[8])}));
+      nearest = std::min(nearest, scale.distance(compromises.back()));
+    }
+    EXPECT_EQ(scale.distance(objectivesOf(finalRuns[0].at(0))), nearest) << "the suggestion is the best of theirs";
+    const std::set<std::vector<double>> expected(front.begin(), front.end());
+    for (const TaskOutcome& outcome : outcomes) {
+      EXPECT_EQ(frontIn(outcome), expected);
+      const auto course = std::ranges::find(outcome.tables, run_files::kParetoCourse, &DataTable::file);
+      ASSERT_NE(course, outcome.tables.end());
+      EXPECT_EQ(course->rows.back()[0], DataTable::Cell(std::int64_t{3 * kRepeatedBudget}));
     }
   }
 }
@@ -134,7 +216,8 @@ TEST_F(RepeatedSearches, TheFirstSampleDeterminesTheScaleOfAll) {
     context.aggregate = [&scale](std::span<const double> values) { return scale.value() * values[0]; };
     found.push_back(rowsOf(task->run(context)));
     for (const auto& row : found.back()) {
-      EXPECT_EQ(std::get<double>(row[3]), *scale * (std::get<double>(row[5]) + std::get<double>(row[6])));
+      EXPECT_EQ(std::get<double>(row[3]), *scale * (std::get<double>(row[6]) + std::get<double>(row[7])));
+      EXPECT_LE(std::get<double>(row[3]), std::get<double>(row[5])) << "the least of the sample, on the same scale";
     }
   }
   EXPECT_EQ(found[0], found[1]);

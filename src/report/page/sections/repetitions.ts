@@ -7,7 +7,7 @@ import { bestSoFar, finite, placeBetweenBounds, quantile, sorted } from '../numb
 import { logRange } from '../ticks';
 import { findingList, heading, isolated, type Finding, type Section } from './section';
 
-const kNear = 0.01; // of the least value: as good as it
+const kNear = 0.01; // of the hypervolume: as good a front
 const kApart = 0.1; // of the range between the bounds: another value of a parameter
 const kMostNamed = 12;
 const kMostRows = 60; // with a name each
@@ -17,7 +17,10 @@ const nameOf = ({ seed, number: of }: Repetition) => `repetition ${of} (seed ${s
 const least = (all: readonly Repetition[]) => finite(all.map(({ aggregate }) => aggregate)).reduce((a, b) => Math.min(a, b), Infinity);
 
 /** Whether its best value is as good as the least of all. */
-const isNear = (one: Repetition, best: number) => one.aggregate !== null && one.aggregate - best <= kNear * Math.abs(best);
+const isNear = ({ tolerance }: Repetitions, one: Repetition, best: number) => one.aggregate !== null && one.aggregate <= best + tolerance;
+
+/** Whether a front was searched for, and no best value. */
+const findsFronts = ({ all }: Repetitions) => all.some(({ hypervolume }) => hypervolume !== undefined);
 
 /** The range of a parameter among the best sets of `some`, and its part of the range between the bounds. */
 interface Spread {
@@ -47,16 +50,21 @@ function findings(data: ReportData, repetitions: Repetitions): Finding[] {
   const values = sorted(all.map(({ aggregate }) => aggregate));
   if (values.length === 0) return [{ kind: 'warning', text: 'No repetition has found a value.' }];
   const best = values[0]!;
-  const near = all.filter((one) => isNear(one, best));
+  const near = all.filter((one) => isNear(repetitions, one, best));
+  const stuck = all.filter(({ aggregate, start }) => aggregate !== null && start !== null && aggregate >= start);
   const isAgreed = 2 * near.length > all.length;
+  if (all.length > 1 && stuck.length === values.length) {
+    return [{ kind: 'warning', text: `None of ${counted(all.length, 'repetition')} found anything better than what it began with, which says nothing of a minimum: the start may be one, or the search does not get away from it.` }];
+  }
   const found: Finding[] = [
     { text: `The best aggregates of ${counted(all.length, 'repetition')}: least ${number(best, 6)}, median ${number(quantile(values, 0.5), 6)}, greatest ${number(values[values.length - 1], 6)}.` },
-    ...(all.length < 2 ? [] : [{ kind: isAgreed ? 'good' as const : 'warning' as const, text: `${count(near.length)} of ${counted(all.length, 'repetition')} ended within ${percent(kNear)} of the least value.${
+    ...(all.length < 2 ? [] : [{ kind: isAgreed ? 'good' as const : 'warning' as const, text: `${count(near.length)} of ${counted(all.length, 'repetition')} ended within ${repetitions.within} value.${
       isAgreed ? '' : ' What the search finds depends on the seed: a larger budget helps, or taking the best of several repetitions, as here.'}` }]),
   ];
   const [without, unfinished] = [all.length - values.length, all.filter(({ termination }) => termination === '').length];
   if (without > 0) found.push({ kind: 'warning', text: `${counted(without, 'repetition')} found no value.` });
   if (unfinished > 0) found.push({ kind: 'warning', text: `${counted(unfinished, 'repetition')} had not ended.` });
+  if (stuck.length > 0) found.push({ text: `${counted(stuck.length, 'repetition')} found nothing better than what it began with.` });
   if (near.length < 2) return found;
   const apart = spreads(data, repetitions, near).filter(({ share }) => share > kApart);
   const text = (spread: Spread) => `${isolated(spread.name)} (${number(spread.low)} to ${number(spread.high)}, ${percent(spread.share, 2)} of its range)`;
@@ -64,6 +72,23 @@ function findings(data: ReportData, repetitions: Repetitions): Finding[] {
     ? { kind: 'warning', text: `These ${count(near.length)} agree in the value, but not in ${listed(apart, text)}: the observations hardly tell such values apart, and the parameter, or what makes up for it, is poorly identifiable.` }
     : { kind: 'good', text: `These ${count(near.length)} agree in their parameters, too: each within ${percent(kApart)} of the range between its bounds.` });
   return found;
+}
+
+/** Of searches for a front: how near each comes to that of all of them. */
+function frontFindings({ front }: ReportData, { all }: Repetitions): Finding[] {
+  const volumes = sorted(all.map(({ hypervolume }) => hypervolume ?? null));
+  const greatest = volumes[volumes.length - 1];
+  if (greatest === undefined) return [{ kind: 'warning', text: 'No repetition has found a front.' }];
+  const ofAll = finite(front?.course?.hypervolumes ?? []).at(-1) ?? greatest;
+  const near = volumes.filter((volume) => volume >= (1 - kNear) * ofAll).length;
+  const unfinished = all.filter(({ termination }) => termination === '').length;
+  return [
+    { text: `The front above is that of all ${counted(all.length, 'repetition')} together. The hypervolumes of their own fronts, on its scale: least ${number(volumes[0], 6)}, median ${number(quantile(volumes, 0.5), 6)}, greatest ${number(greatest, 6)}; that of all ${number(ofAll, 6)}.` },
+    ...(all.length < 2 || !(ofAll > 0) ? [] : [near === all.length
+      ? { kind: 'good' as const, text: `Whatever the seed, the search found nearly the same front: each hypervolume is within ${percent(kNear)} of that of all.` }
+      : { kind: 'warning' as const, text: `${count(near)} of ${counted(all.length, 'repetition')} come within ${percent(kNear)} of the hypervolume of all: the front that a single search finds depends on the seed. A larger budget helps, or taking the front of several repetitions, as here.` }]),
+    ...(unfinished > 0 ? [{ kind: 'warning' as const, text: `${counted(unfinished, 'repetition')} had not ended.` }] : []),
+  ];
 }
 
 interface Course {
@@ -125,12 +150,30 @@ function coursePlan(courses: Course[]): ChartPlan {
   };
 }
 
-function bestPlan(all: Repetition[], best: number): ChartPlan {
+function volumePlan({ all }: Repetitions): ChartPlan {
+  const order = all.filter(({ hypervolume }) => hypervolume != null).sort((a, b) => b.hypervolume! - a.hypervolume!);
+  const isNamed = order.length <= kMostRows;
+  return {
+    title: 'The hypervolume of each repetition\u2019s front',
+    note: 'From the greatest to the least, on the scale of the front of all.',
+    height: 56 + Math.max(6, Math.min(26, 900 / order.length)) * order.length,
+    option: (look) => ({
+      grid: { left: 24, right: 24, top: 4, bottom: 16 },
+      xAxis: axis(look, { boundaryGap: ['3%', '3%'], axisLabel: { showMinLabel: false, showMaxLabel: false } }),
+      yAxis: axis(look, { type: 'category', data: order.map(nameOf), inverse: true, axisTick: { show: false }, axisLabel: { show: isNamed, color: look.ink, interval: 0 } }),
+      tooltip: tooltip(look, { formatter: (dot: { value: [number, string] }) => tip(dot.value[1], [['hypervolume', number(dot.value[0], 6)]]) }),
+      series: [{ type: 'scatter', symbolSize: isNamed ? 9 : 5, itemStyle: { color: look.best }, data: order.map((one) => [one.hypervolume!, nameOf(one)]) }],
+    }),
+  };
+}
+
+function bestPlan(repetitions: Repetitions, best: number): ChartPlan {
+  const { all, tolerance, within } = repetitions;
   const order = all.filter(({ aggregate }) => aggregate !== null).sort((a, b) => a.aggregate! - b.aggregate!);
   const isNamed = order.length <= kMostRows;
   return {
     title: 'The best aggregate of each repetition',
-    note: `From the least to the greatest. Within the shaded part they are within ${percent(kNear)} of the least.`,
+    note: `From the least to the greatest. Within the shaded part they are within ${within}.`,
     height: 56 + Math.max(6, Math.min(26, 900 / order.length)) * order.length,
     switches: best > 0 ? [{ key: 'log', label: 'Log' }] : [],
     option: (look, is) => ({
@@ -139,27 +182,30 @@ function bestPlan(all: Repetition[], best: number): ChartPlan {
       yAxis: axis(look, { type: 'category', data: order.map(nameOf), inverse: true, axisTick: { show: false }, axisLabel: { show: isNamed, color: look.ink, interval: 0 } }),
       tooltip: tooltip(look, { formatter: (dot: { value: [number, string] }) => tip(dot.value[1], [['best aggregate', number(dot.value[0], 6)]]) }),
       series: [{
-        type: 'scatter', symbolSize: isNamed ? 9 : 5, data: order.map((one) => ({ value: [one.aggregate, nameOf(one)], itemStyle: { color: isNear(one, best) ? look.best : look.dots } })),
-        markArea: { silent: true, itemStyle: { color: look.band, opacity: 0.15 }, data: [[{ xAxis: best }, { xAxis: best + kNear * Math.abs(best) }]] },
+        type: 'scatter', symbolSize: isNamed ? 9 : 5, data: order.map((one) => ({ value: [one.aggregate, nameOf(one)], itemStyle: { color: isNear(repetitions, one, best) ? look.best : look.dots } })),
+        markArea: { silent: true, itemStyle: { color: look.band, opacity: 0.15 }, data: [[{ xAxis: best }, { xAxis: best + tolerance }]] },
       }],
     }),
   };
 }
 
 /** The parameters of the best sets, between their bounds. */
-function parameterPlan(variable: Parameter[], { all, parameters }: Repetitions, best: number): ChartPlan {
+function parameterPlan(variable: Parameter[], repetitions: Repetitions, best: number): ChartPlan {
+  const { all, parameters, within } = repetitions;
   const names = parameters;
-  const dots = (isOfNear: boolean) => names.flatMap((name, index) => all.filter((one) => isNear(one, best) === isOfNear).flatMap((one) => {
+  const areFronts = findsFronts(repetitions);
+  const isOne = (one: Repetition) => areFronts || isNear(repetitions, one, best);
+  const dots = (isOfNear: boolean) => names.flatMap((name, index) => all.filter((one) => isOne(one) === isOfNear).flatMap((one) => {
     const place = variable[index] ? placeBetweenBounds(variable[index]!, one.parameters[index] ?? null) : null;
     return place === null ? [] : [[100 * place, name, one.parameters[index]!, one.number]];
   }));
-  const near = `within ${percent(kNear)} of the least`;
+  const near = areFronts ? 'compromises' : `within ${within}`;
   return {
-    title: 'The parameters of the best sets, between their bounds',
-    note: '0 % is the lower, 100 % the upper bound, on the scale of the search. Dots of one colour that lie apart say that other values of the parameter are as good.',
+    title: `The parameters of the ${areFronts ? 'compromises' : 'best sets'}, between their bounds`,
+    note: `0 % is the lower, 100 % the upper bound, on the scale of the search. ${areFronts ? 'The compromise of a repetition is the set of its front that is nearest to the ideal point of the front of all.' : 'Dots of one colour that lie apart say that other values of the parameter are as good.'}`,
     height: 90 + Math.max(14, Math.min(30, 900 / names.length)) * names.length,
     option: (look) => ({
-      legend: legend(look, { data: [near, 'others'] }),
+      legend: legend(look, { data: areFronts ? [near] : [near, 'others'] }),
       grid: { left: 24, right: 24, top: 36, bottom: 16 },
       xAxis: axis(look, { min: 0, max: 100, axisLabel: { formatter: (value: number) => `${value} %` } }),
       yAxis: axis(look, { type: 'category', data: names, inverse: true, axisTick: { show: false }, splitLine: { show: true, lineStyle: { color: look.rule } },
@@ -181,22 +227,42 @@ function parameterPlan(variable: Parameter[], { all, parameters }: Repetitions, 
   };
 }
 
+const kTitle = 'The search with other seeds';
+const whyItEnded = ({ termination }: Repetition) => termination || 'it had not ended';
+
+function frontRepetitions(data: ReportData, repetitions: Repetitions): Section {
+  const { all, parameters } = repetitions;
+  const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), number(one.hypervolume, 6), one.best > 0 ? count(one.best) : '', whyItEnded(one)]);
+  return {
+    id: 'repetitions',
+    title: kTitle,
+    content: [
+      findingList(frontFindings(data, repetitions)),
+      table([{ title: 'Repetition' }, { title: 'Seed', number: true }, { title: 'Evaluations', number: true }, { title: 'Hypervolume', number: true },
+        { title: 'Compromise', number: true, hint: 'The evaluation' }, { title: 'Why it stopped' }], rows, 'Repetitions'),
+      ...(all.length > 1 ? [heading('Spread'), chart(volumePlan(repetitions)),
+        ...(parameters.length > 0 ? [chart(parameterPlan(variableParameters(data), repetitions, least(all)))] : [])] : []),
+    ],
+  };
+}
+
 export function repetitionSection(data: ReportData): Section | null {
   const { repetitions } = data;
+  if (repetitions && findsFronts(repetitions)) return frontRepetitions(data, repetitions);
   if (!repetitions || repetitions.all.length === 0) return null;
   const { all, parameters } = repetitions;
   const best = least(all);
   const courses = coursesOf(data, repetitions);
-  const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), number(one.aggregate, 6), count(one.best), one.termination ? count(one.loops) : '', one.termination || 'it had not ended']);
+  const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), number(one.aggregate, 6), count(one.best), one.termination ? count(one.loops) : '', whyItEnded(one)]);
   return {
     id: 'repetitions',
-    title: 'The search with other seeds',
+    title: kTitle,
     content: [
       findingList(findings(data, repetitions)),
       table([{ title: 'Repetition' }, { title: 'Seed', number: true }, { title: 'Evaluations', number: true }, { title: 'Best aggregate', number: true },
         { title: 'Found by', number: true, hint: 'The evaluation' }, { title: 'Loops', number: true }, { title: 'Why it stopped' }], rows, 'Repetitions'),
       ...(courses.length > 0 ? [heading('Courses'), chart(coursePlan(courses))] : []),
-      ...(Number.isFinite(best) && all.length > 1 ? [heading('Spread'), chart(bestPlan(all, best)),
+      ...(Number.isFinite(best) && all.length > 1 ? [heading('Spread'), chart(bestPlan(repetitions, best)),
         ...(parameters.length > 0 ? [chart(parameterPlan(variableParameters(data), repetitions, best))] : [])] : []),
     ],
   };
