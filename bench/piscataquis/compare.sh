@@ -120,7 +120,13 @@ posterior() {
     { if ($at["R-hat"] > largest) largest = $at["R-hat"]
       if (fewest == "" || $at["Effective size"] < fewest) fewest = $at["Effective size"]
       if ($at["Kind"] == "error") printf "%s %.4g (%.4g to %.4g), ", $1, $at["Mean"], $at["5 %"], $at["95 %"] }
-    END { printf "largest R-hat %.3f, least effective sample size %.0f\n", largest, fewest }' "${setup}_Posterior.dat"
+    { if ($at["R-hat"] > 1.05) wide = wide sprintf("%s %s", wide == "" ? "; R-hat above 1.05:" : ",", $1) }
+    { if ($at["R-hat"] <= 1.05 && (ofOthers == "" || $at["Effective size"] < ofOthers)) ofOthers = $at["Effective size"] }
+    END {
+      printf "largest R-hat %.3f, least effective sample size %.0f%s", largest, fewest, wide
+      if (wide != "") printf "; least effective sample size of the others %.0f", ofOthers
+      print ""
+    }' "${setup}_Posterior.dat"
   printf '%s\n' "$@" | awk '
     FNR == NR { names[++n] = $1; likely[n] = $2; for (j = 1; j <= 6; ++j) value[n, j] = $(j + 2); next }
     FNR == 1 { FS = "\t"; $0 = $0 }
@@ -184,6 +190,18 @@ echo "DREAM, dream.kdx: the best set of a search for the same likelihood, and th
 # shellcheck disable=SC2086
 likelyOfSquares=$(likelihood $bySquares)
 posterior dream "most-likely $(awk -v x="$minus" 'BEGIN { print -x }') $byLikelihood" "least-RMSE $likelyOfSquares $bySquares"
+# CTG has two peaks.
+awk -F '\t' "$heading"'
+  { isFar = $at["CTG"] > 0.25; if (isFar && $at["Burn_In"] == 0 && first == "") first = $at["Generation"]; last = $at["Generation"] }
+  $at["Burn_In"] == 0 {
+    far[$at["Chain"]] += isFar; ++n[$at["Chain"]]
+    if (!(isFar in top) || $at["Log_Likelihood"] > top[isFar]) top[isFar] = $at["Log_Likelihood"]
+  }
+  END {
+    printf "states with CTG above 0.25, of each chain:"
+    for (chain = 1; chain in n; ++chain) printf " %.0f %%", 100 * far[chain] / n[chain]
+    printf "; from generation %d of %d on; log-likelihood of the best of them %.1f, of the others %.1f\n", first, last, top[1], top[0]
+  }' dream_Chains.dat
 echo
 echo "DREAM with independent normal errors, for which the least RMSE is the most likely: of seed 1 $(printf %.3f "$rmse"), of seed 2 $(printf %.3f "$rmse2")"
 posterior normal "seed-1 $(normalOf "$rmse") $bySquares" "seed-2 $(normalOf "$rmse2") $bySquares2"
