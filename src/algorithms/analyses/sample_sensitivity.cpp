@@ -15,6 +15,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/numbers/sample_summary.h"
+#include "common/short_list.h"
 
 namespace mirevo {
 namespace {
@@ -279,28 +280,23 @@ std::vector<std::size_t> byImportance(const OutputDependence& output) {
 void appendJudgement(const OutputDependence& output, const AnalysisNames& names, std::vector<std::string>& lines) {
   constexpr double kNegligible = 0.05;
   constexpr double kWide = 0.1;
-  std::string negligible;
-  std::string constant;
-  std::size_t others = 0;
-  std::size_t constants = 0;
-  const auto add = [&](std::string& list, std::size_t& count, std::size_t j) {
-    if (count++ < kMostShownParameters) list += (list.empty() ? "" : ", ") + names.parameters[j];
-  };
+  ShortList negligible(kMostShownParameters);
+  ShortList constant(kMostShownParameters);
   double widest = 0.0;
   for (std::size_t j = 0; j < output.parameters.size(); ++j) {
     const SampleDependence& one = output.parameters[j];
     widest = std::fmax(widest, 0.5 * (one.upper - one.lower));
-    if (!one.isVaried) add(constant, constants, j);
-    if (one.upper < kNegligible) add(negligible, others, j);
+    if (!one.isVaried) constant.add(names.parameters[j]);
+    if (one.upper < kNegligible) negligible.add(names.parameters[j]);
   }
-  if (others > kMostShownParameters) negligible += fmt::format(" and {} more", others - kMostShownParameters);
-  if (constants > kMostShownParameters) constant += fmt::format(" and {} more", constants - kMostShownParameters);
-  if (!constant.empty()) lines.push_back("   Not varied in this sample, which says nothing of them: " + constant);
-  if (!negligible.empty()) {
+  if (!constant.isEmpty()) {
+    lines.push_back("   Not varied in this sample, which says nothing of them: " + constant.text());
+  }
+  if (!negligible.isEmpty()) {
     lines.push_back(
         fmt::format("   Less than {:g} of the variance each, by themselves: {}; what they do together with "
                     "others does not show here",
-                    kNegligible, negligible));
+                    kNegligible, negligible.text()));
   }
   if (widest > kWide) {
     lines.push_back(
