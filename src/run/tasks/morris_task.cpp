@@ -43,10 +43,7 @@ void MorrisTask::read(const TaskReading& reading) {
   }
   if (own) tellOfDesign(*own);
   distributions = readDistributions(reading, section);
-  givesDistributions = false;
-  for (std::size_t j = 1; j <= reading.variableCount; ++j) {
-    givesDistributions = givesDistributions || section.holds(fmt::format("PARAMETER_{}", j));
-  }
+  givesDistributions = firstDistribution(section, reading.variableCount).has_value();
   ParameterModel model({reading.parameters.begin(), reading.parameters.end()},
                        {reading.constraints.begin(), reading.constraints.end()});
   plan_.reset();
