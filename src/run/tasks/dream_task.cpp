@@ -1,6 +1,7 @@
 #include "run/tasks/dream_task.h"
 
 #include <algorithm>
+#include <limits>
 
 #include <fmt/format.h>
 
@@ -149,27 +150,36 @@ void DreamTask::continueFrom(const std::vector<EarlierSearch>& searches) {
   dream.sampler.leastRuns = searches.back().lastEvaluation;
 }
 
-void DreamTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
-  constexpr int kMostDraws = 100'000;
-  ChainRandom random(1);
-  std::vector<double> unit(prior_.size());
-  std::string reason = "they lie outside the bounds";
-  for (int k = 0; k < kMostDraws; ++k) {
-    for (double& value : unit) value = random.uniform();
-    const ParameterSet set = prior_.setAt(unit);
-    bool isInside = true;
-    for (std::size_t j = 0; j < set.size(); ++j) {
-      isInside = isInside && set[j] >= space.lower[j] && set[j] <= space.upper[j];
-    }
-    if (!isInside) continue;
+/// One that can be run; otherwise empty, with the reason.
+std::optional<ParameterSet> DreamTask::priorSet(const SearchSpace& space, const Feasibility& feasibility,
+                                                std::string& reason) const {
+  reason = "they lie outside the bounds";
+  DreamProblem problem;
+  problem.lower = space.lower;
+  problem.upper = space.upper;
+  problem.drawPrior = [this](std::span<const double> unit) { return prior_.setAt(unit); };
+  problem.logPrior = [&](std::span<const double> set) {
     const auto violation = feasibility.violation(set);
-    if (!violation) return;
+    if (!violation) return prior_.logDensity(set);
     reason = *violation;
-  }
-  fatalError(
-      feasibility.isTested() ? feasibility.noSetMessage()
-                             : "Error: No parameter set found in the prior that can be run",
-      fmt::format("{}: none of {} sets drawn from the prior of DREAM can be run: {}", dream.place, kMostDraws, reason));
+    return -std::numeric_limits<double>::infinity();
+  };
+  ChainRandom random(1);
+  return drawAllowed(problem, random);
+}
+
+void DreamTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
+  std::string reason;
+  if (priorSet(space, feasibility, reason)) return;
+  fatalError(feasibility.isTested() ? feasibility.noSetMessage()
+                                    : "Error: No parameter set found in the prior that can be run",
+             fmt::format("{}: none of {} sets drawn from the prior of DREAM can be run: {}", dream.place,
+                         kMostPriorDraws, reason));
+}
+
+std::optional<ParameterSet> DreamTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {
+  std::string reason;
+  return priorSet(space, feasibility, reason);
 }
 
 TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {

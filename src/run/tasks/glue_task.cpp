@@ -197,6 +197,11 @@ std::vector<std::string> GlueTask::setDoubts(const SearchSpace& /*space*/, const
       .texts();
 }
 
+std::optional<ParameterSet> GlueTask::trialSet(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
+  if (isOfEarlierRun()) return std::nullopt;
+  return firstFeasible(feasibility, drawSample(feasibility).sets);
+}
+
 EarlierSample GlueTask::evaluateSample(const TaskContext& context) const {
   const FeasibleSample drawn = drawSample(context.feasibility);
   if (drawn.drawnCount > std::ssize(drawn.sets)) {

@@ -1,5 +1,6 @@
 #include "run/tasks/infeasible_sets.h"
 
+#include <algorithm>
 #include <utility>
 
 #include <fmt/format.h>
@@ -54,6 +55,12 @@ void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterS
   } else {
     context.log.warning(found.text);
   }
+}
+
+std::optional<ParameterSet> firstFeasible(const Feasibility& feasibility, std::span<const ParameterSet> sets) {
+  const auto found = std::ranges::find_if(sets, [&](const ParameterSet& set) { return feasibility.holds(set); });
+  if (found == sets.end()) return std::nullopt;
+  return *found;
 }
 
 }  // namespace mirevo

@@ -100,6 +100,15 @@ void MorrisTask::requireSets(const SearchSpace& space, const Feasibility& feasib
              fmt::format("No elementary effect has two sets that can be run: {}", plan.violation));
 }
 
+std::optional<ParameterSet> MorrisTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {
+  const EffectPlan& plan = planIn(space, feasibility);
+  for (const EffectTrajectory& trajectory : plan.trajectories) {
+    const std::vector<ParameterSet> sets = setsOf(plan, trajectory, distributionsIn(space));
+    if (!sets.empty()) return sets.front();
+  }
+  return std::nullopt;
+}
+
 TaskOutcome MorrisTask::outcomeOf(const TaskContext& context, const EffectPlan& plan,
                                   const EffectResults& results) const {
   const AnalysisNames names = analysisNames(context);
