@@ -122,6 +122,17 @@ std::string textOf(const FatalError& error) {
   return error.detail().empty() ? error.message() : error.message() + "\n" + error.detail();
 }
 
+/// Told with what to do, which the system's reason alone does not say.
+void requireRoomForFolder(const std::string& folder) {
+  const std::string parent = std::filesystem::path(folder).parent_path();
+  if (::access(folder.c_str(), F_OK) == 0 || ::access(parent.c_str(), W_OK | X_OK) == 0) return;
+  fatalError(
+      fmt::format("Unable to create the folder {}: {}. ProcessFolder in the section SimultaneousSimulations names "
+                  "another folder for the process folders, one that can be written, or the permissions of {} "
+                  "need to be changed",
+                  folder, std::strerror(errno), parent));
+}
+
 }  // namespace
 
 PosixProcessLauncher::~PosixProcessLauncher() {
@@ -236,6 +247,7 @@ void PosixProcessLauncher::makeFolders(const LauncherSettings& settings) {
       fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
                              settings.baseFolder, folder));
     }
+    requireRoomForFolder(folder);
     slots_.emplace_back().folder = folder;
   }
   const auto look = [&settings] {
