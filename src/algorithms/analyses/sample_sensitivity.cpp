@@ -201,6 +201,10 @@ std::size_t bootstrapCount(std::size_t rows, std::size_t parameters, std::size_t
 void addFirstOrder(const std::vector<Order>& orders, const Columns& outputs, std::int32_t seed,
                    std::span<OutputDependence*> found) {
   WeightedOutputs weighted(outputs);
+  for (std::size_t q = 0; q < found.size(); ++q) {
+    const double variance = weighted.sumOfSquares(q);
+    found[q]->hasVariance = std::isfinite(variance) && variance > 0.0;
+  }
   const std::size_t n = weighted.rowCount();
   const FirstOrder firstOrder(n);
   const auto isVaried = [&](std::size_t j) { return orders[j].ends.size() > 1; };
@@ -246,7 +250,11 @@ void addDependences(const Columns& parameters, const std::vector<std::size_t>& r
                     std::int32_t seed, std::span<OutputDependence*> found) {
   Columns outputRanks;
   outputRanks.reserve(outputs.size());
-  for (const std::vector<double>& output : outputs) outputRanks.push_back(ranksOf(orderOf(output)));
+  for (std::size_t q = 0; q < outputs.size(); ++q) {
+    const Order order = orderOf(outputs[q]);
+    found[q]->isConstant = order.ends.size() == 1;
+    outputRanks.push_back(ranksOf(order));
+  }
   std::vector<Order> orders;
   for (std::size_t j = 0; j < parameters.size(); ++j) {
     std::vector<double> values;
@@ -395,7 +403,11 @@ std::vector<std::string> formatSampleSensitivity(const SampleSensitivity& sensit
     for (std::string& line : formatTable("Dependence of " + output.name, headings, shown, rows)) {
       lines.push_back(std::move(line));
     }
-    if (hasIndices) {
+    if (hasIndices && output.isConstant) {
+      lines.emplace_back("   No indices: all runs have the same value");
+    } else if (hasIndices && !output.hasVariance) {
+      lines.push_back(fmt::format("   No first-order indices: {}", kNoFiniteVariance));
+    } else if (hasIndices) {
       appendJudgement(output, names, lines);
     } else {
       lines.push_back(fmt::format("   {} runs with a value are too few for first-order indices, at least {}",

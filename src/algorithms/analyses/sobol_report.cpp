@@ -7,6 +7,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sample_sensitivity.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "common/run_files.h"
 #include "common/short_list.h"
@@ -75,8 +76,7 @@ std::string whyNoIndices(const SobolIndices& indices) {
   if (indices.valueCount < 2) return "no indices, too few runs succeeded";
   if (indices.isConstant) return "no parameter has an influence, all runs have the same value";
   if (hasVariance(indices)) return "";
-  return "no indices, the variance of its values is not a finite number: they are as large as 1e150, or as small as "
-         "1e-150";
+  return fmt::format("no indices, {}", kNoFiniteVariance);
 }
 
 /// "2 of the 64 blocks make more than 90 % of the variance, and other points may give other indices"
