@@ -1,6 +1,7 @@
 #include "run/tasks/dream_task.h"
 
 #include <algorithm>
+#include <cmath>
 #include <limits>
 
 #include <fmt/format.h>
@@ -25,6 +26,30 @@ constexpr std::size_t kMostPriorValues = 4'000'000;  // 32 MB
 constexpr const char* kPriorRefusal = "Error: Prior of DREAM invalid";
 constexpr CodeName kFormName{std::nullopt, "DREAM"};
 
+/// Of a prior with so high a peak at an end that numbers, which are no finer there, cannot tell its values apart.
+std::vector<std::string> boundWarnings(const Distribution& prior, const SearchSpace& space, std::size_t j) {
+  constexpr double kTooMuch = 1e-3;
+  constexpr double kLeast = std::numeric_limits<double>::min();
+  const double lower = std::max(space.lower[j], prior.quantile(kLeast));
+  const double upper = std::min(space.upper[j], prior.quantile(1.0 - std::numeric_limits<double>::epsilon() / 2.0));
+  const double all = prior.cumulative(space.upper[j]) - prior.cumulative(space.lower[j]);
+  std::vector<std::string> texts;
+  const auto add = [&](double probability, std::string_view end, double value) {
+    if (!(probability > kTooMuch * all)) return;
+    texts.push_back(
+        fmt::format("{:.2g} % of the prior's probability of {} lies within the rounding of numbers at its {} end, {:g} "
+                    "(search scale): a chain that comes there stays. Expected a prior with a density that is finite "
+                    "there, such as that of a beta distribution with an {} of 1 or more, or bounds that leave the end "
+                    "out",
+                    100.0 * probability / all, space.names[j], end, value, end == "lower" ? "Alpha" : "Beta"));
+  };
+  const double above = std::nextafter(lower, std::numeric_limits<double>::infinity());
+  const double below = std::nextafter(upper, -std::numeric_limits<double>::infinity());
+  add(prior.cumulative(above) - prior.cumulative(space.lower[j]), "lower", lower);
+  add(prior.upperTail(below) - prior.upperTail(space.upper[j]), "upper", upper);
+  return texts;
+}
+
 }  // namespace
 
 const TaskFacts& DreamTask::facts() const {
@@ -48,6 +73,11 @@ void DreamTask::read(const TaskReading& reading) {
   UncertaintySection filled{settings, randomSeed};
   section.read(uncertaintySection(), filled);
   section.require(validateBandEnd(settings, reading.period));
+  if (settings.redrawsInfeasible) {
+    section.warn(kRedrawKeyword,
+                 "has no effect with Uncertainty_Type = 'DREAM': chains begin in sets that can be run, and reject "
+                 "proposals that cannot, without a model run");
+  }
   prior_ = readDistributions(reading, section);
   if (const auto discrete = prior_.firstWithoutDensity()) {
     section.refuse(kPriorRefusal, kUncertaintyTypeKeyword,
@@ -125,7 +155,11 @@ std::vector<std::string> DreamTask::summaryLines(const SearchSpace& space) const
 }
 
 std::vector<std::string> DreamTask::warnings(const SearchSpace& space) const {
-  return distributionWarnings(prior_, space);
+  std::vector<std::string> texts = distributionWarnings(prior_, space);
+  for (std::size_t j = 0; j < prior_.size(); ++j) {
+    for (std::string& text : boundWarnings(prior_[j], space, j)) texts.push_back(std::move(text));
+  }
+  return texts;
 }
 
 /// The chains begin as they did, whatever Sample_Size, R_Hat_Limit and Effective_Size are now: burn-in keeps its
@@ -191,8 +225,9 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   const auto summary =
       summarisePosterior(*sampler_, dimensions, prior, static_cast<std::size_t>(std::max(settings.matrixLimit, 0)));
   const std::string correlationFile = fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation));
-  outcome.report = formatPosterior(dream.sampler, *sampler_, dimensions, summary ? &*summary : nullptr,
-                                   target_->failures(), correlationFile);
+  outcome.report =
+      formatPosterior(dream.sampler, *sampler_, dimensions, summary ? &*summary : nullptr, target_->failures(),
+                      {fileNameOf(runFilePath(context.filePrefix, run_files::kPosterior)), correlationFile});
   if (target_->hasCounted()) {
     const auto counts = target_->countLines();
     auto place = outcome.report.begin() + 1;
