@@ -21,6 +21,7 @@ namespace mirevo {
 namespace {
 
 constexpr std::size_t kPriorDraws = 40'000;
+constexpr std::size_t kMostListed = 50;  // priors in the log
 constexpr std::size_t kLeastPriorDraws = 1'000;
 constexpr std::size_t kMostPriorValues = 4'000'000;  // 32 MB
 constexpr const char* kPriorRefusal = "Error: Prior of DREAM invalid";
@@ -144,7 +145,7 @@ std::string DreamTask::description() const {
 
 std::vector<std::string> DreamTask::summaryLines(const SearchSpace& space) const {
   const DreamSettings& own = dream.sampler;
-  std::vector<std::string> lines = distributionLines(prior_, space, kUncertaintySection);
+  std::vector<std::string> lines = distributionLines(prior_, space, kUncertaintySection, kMostListed);
   lines.insert(lines.end(),
                {fmt::format("Likelihood: {}", kLikelihoodNames[static_cast<std::size_t>(*dream.errors.form)].name),
                 fmt::format("{} chains, at most {} model runs; the first {:g} of them are burn-in", own.chainCount,
