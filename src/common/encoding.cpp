@@ -68,8 +68,7 @@ std::string faultOfEncoding(std::string_view content) {
   const auto line = std::count(content.begin(), content.begin() + static_cast<std::ptrdiff_t>(at), '\n') + 1;
   return fmt::format(
       "line {} holds a zero byte (NUL), which no text has: save the file as UTF-8 text, for example with tr -d "
-      "'\\000', "
-      "if nothing else is wrong with it",
+      "'\\000', if nothing else is wrong with it",
       line);
 }
 

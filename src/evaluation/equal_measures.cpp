@@ -5,6 +5,7 @@
 
 #include <fmt/core.h>
 
+#include "common/short_list.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -19,11 +20,9 @@ std::string listOf(std::span<const std::string> names) {
   for (const std::string& name : names) {
     if (std::find(different.begin(), different.end(), name) == different.end()) different.push_back(name);
   }
-  const std::size_t shown = std::min(different.size(), kMostNamed);
-  std::string list;
-  for (std::size_t i = 0; i < shown; ++i) list += (i == 0 ? "" : ", ") + different[i];
-  if (shown < different.size()) list += fmt::format(" and {} more", different.size() - shown);
-  return list;
+  ShortList list(kMostNamed);
+  for (const std::string& name : different) list.add(name);
+  return list.text();
 }
 
 }  // namespace

@@ -563,8 +563,7 @@ std::optional<std::vector<double>> InstructionFile::read(const std::string& sour
         reader.atCommaCount() > 1 ? fmt::format("; so are {} more read", reader.atCommaCount() - 1) : "";
     doubts->push_back(
         fmt::format("{}:{}:{}: of {} only {} is read, as a comma ends a number: if it marks thousands or decimals, let "
-                    "the model write "
-                    "numbers without; if it separates, read on behind it, as with !dum! ({}:{}:{}){}",
+                    "the model write numbers without; if it separates, read on behind it, as with !dum! ({}:{}:{}){}",
                     sourceName, found->lineNumber, found->column, shortQuoted(found->whole), shortQuoted(found->taken),
                     sourceName_, at.line, at.column, more));
   }

@@ -11,6 +11,7 @@
 #include "common/calendar.h"
 #include "common/encoding.h"
 #include "common/files.h"
+#include "common/short_list.h"
 #include "common/take_text.h"
 #include "common/text.h"
 #include "common/utf8.h"
@@ -25,12 +26,9 @@ constexpr std::string_view kNoPrefix = "values";  ///< the series of names that 
 
 /// "a", "b", "c" and 4 more
 std::string listOf(const std::vector<std::string>& names) {
-  std::string list;
-  for (std::size_t i = 0; i < std::min(names.size(), kMostNamed); ++i) {
-    list += (i == 0 ? "" : ", ") + quotedForMessage(names[i]);
-  }
-  if (names.size() > kMostNamed) list += fmt::format(" and {} more", names.size() - kMostNamed);
-  return list;
+  ShortList list(kMostNamed);
+  for (const std::string& name : names) list.add(quotedForMessage(name));
+  return list.text();
 }
 
 std::string timeText(std::int64_t second) {

@@ -53,6 +53,7 @@ struct SeriesReference {
   std::string itemLocation = {};
   bool isDefaultItem = false;     ///< the setup does not say which item
   bool hasItemNo = false;         ///< the number is known, which may be beside the name
+  bool isOfModel = false;         ///< the model writes the file
   TextForm form = {};             ///< of a text file
   std::string formLocation = {};  ///< likewise, of the first keyword that tells the form
   ListingSettings listingSettings = {};

@@ -123,7 +123,15 @@ std::unique_ptr<TimeSeriesObject> openTimeSeries(const SeriesReference& referenc
   }
   try {
     series->willRead(items);
-    if (!series->open(name)) fatalError(message, reference.fileLocation + series->lastError() + series->firstLines());
+    if (!series->open(name)) {
+      std::error_code ignored;
+      const bool isToBeWritten = reference.isOfModel && !std::filesystem::exists(name, ignored);
+      fatalError(message,
+                 reference.fileLocation + series->lastError() + series->firstLines() +
+                     (isToBeWritten ? "\nThe model writes it: run the model once in its own folder, by its batch "
+                                      "file, as what it writes must be there before the first run"
+                                    : ""));
+    }
   } catch (const std::bad_alloc&) {
     series.reset();
     fatalError(message, fmt::format("{}{}: {}", reference.fileLocation, name, kTooMuchMemory));

@@ -251,7 +251,9 @@ std::vector<double> allModelValues(ParameterModel& model, std::span<const double
   std::vector<double> all(parameters.size(), std::numeric_limits<double>::quiet_NaN());
   if (values != nullptr && !failed) all.assign(values->begin(), values->end());
   next = 0;
-  for (std::size_t i = 0; i < all.size(); ++i) {  // exactly, where the transformation rounds
+  for (std::size_t i = 0; i < all.size(); ++i) {
+    if (parameters[i].parameterType == ParameterType::fixed) all[i] = parameters[i].initialValue;
+    // Exactly, where the transformation rounds.
     if (parameters[i].parameterType == ParameterType::variable) all[i] = variable[next++];
   }
   return all;

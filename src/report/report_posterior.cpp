@@ -328,8 +328,7 @@ std::vector<std::string> adviceOf(const ReportedPosterior& posterior, Convergenc
   if (!posterior.isUnfinished) {
     advice.emplace_back(
         "Bounds or priors that are narrower around good sets, and a likelihood that fits the errors, shorten the way; "
-        "a "
-        "run with other ones begins anew");
+        "a run with other ones begins anew");
   }
   return advice;
 }

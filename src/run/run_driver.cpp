@@ -130,7 +130,10 @@ void RunDriver::openRun(const std::string& setupFileName) {
   requireReplaceable(logFile, run_files::kLog);
   const std::string keptLog = RunLog::isOfNoRun(logFile) ? std::string() : keepEarlierFile(logFile);
   std::string reason;
-  if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
+  if (!state_.log.open(logFile, reason)) {
+    fatalError("Error: Unable to open " + logFile,
+               reason + ": a run writes its log and its results beside the setup, in a folder that must be writable");
+  }
   signalState.runLogDescriptor = state_.log.descriptor();
   state_.log.line(fmt::format("Mirevo {}, started {}", programVersion(), dateAndTimeNow()));
   state_.log.line("Setup file: " + setup.file);

@@ -12,6 +12,7 @@
 #include "common/fatal_error.h"
 #include "common/progress_messages.h"
 #include "common/run_files.h"
+#include "common/short_list.h"
 #include "common/text.h"
 #include "platform/terminal/front_end.h"
 
@@ -91,14 +92,12 @@ void RunReporter::fileAbsent(const std::string& name, std::string_view text) {
 
 std::string RunReporter::absentWarning() const {
   constexpr std::size_t kMostNamed = 5;
-  std::size_t count = 0;
-  std::string list;
+  ShortList list(kMostNamed);
   for (const auto& [name, runs] : absences_) {
-    if (runs <= 1 || ++count > kMostNamed) continue;
-    list += fmt::format("{}{} ({} model runs)", list.empty() ? "" : ", ", name.substr(1), runs);
+    if (runs > 1) list.add(fmt::format("{} ({} model runs)", name.substr(1), runs));
   }
-  if (count > kMostNamed) list += fmt::format(" and {} more", count - kMostNamed);
-  return list.empty() ? list : "Output files to be kept that model runs have not left: " + list;
+  if (list.isEmpty()) return {};
+  return "Output files to be kept that model runs have not left: " + list.text();
 }
 
 void RunReporter::recordEvaluation(std::span<const double> set, const EvaluationResult& result) {

@@ -51,15 +51,17 @@ class SetupCheck final {
   void runModel();
   void checkEarlierResults(const SearchSpace& space, std::span<const ObservedSeries> observed);
   /// Throws FatalError if the run yields no result.
-  void judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set);
-  static EvaluationResult resultOf(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set);
-  void printParameters(ParameterModel& parameters);
+  void judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set, std::string_view what);
+  EvaluationResult resultOf(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set);
+  void tryModel(ParameterModel& parameters, ModelRunner& runner, ProcessLauncher& launcher);
+  void printParameters(ParameterModel& parameters, std::string_view title, std::span<const double> set);
   void printResult(const EvaluationResult& result, ModelRunner& runner);
 
   RunLog log_;  ///< never opened: of it the warnings alone are needed
   RunConfig config_;
   int warningCount_ = 0;
   int exitCode_ = 0;
+  bool isRun_ = true;  ///< the model; false: its parameter set cannot be
 };
 
 void SetupCheck::run(const std::string& setupFileName) {
@@ -98,17 +100,39 @@ void SetupCheck::runModel() {
   settings.warn = warnAbout;
   ModelRunner runner(std::move(model), parameters, aggregator, launcher, settings);
   for (const std::string& text : modelDoubts(config_, parameters, runner)) warnAbout(text);
-  printParameters(parameters);
   const std::string folder = launcher.getProcessFolder(1);
-  print(fmt::format("The model is run in {}", folder));
   try {
-    judgeRun(runner, launcher, parameters.searchSpace().initial);
+    tryModel(parameters, runner, launcher);
   } catch (const FatalError& error) {
+    if (!isRun_) {
+      removeTree(folder);
+      throw;
+    }
     const std::string kept = "The folder in which the model was run is kept: " + folder;
     fatalError(error.message(), error.detail().empty() ? kept : error.detail() + "\n" + kept);
   }
   removeTree(folder);  // while it is still locked
   checkEarlierResults(parameters.searchSpace(), runner.output().observedSeries());
+}
+
+/// With the initial values; where these cannot be run and the task does without them, with a set of the task.
+void SetupCheck::tryModel(ParameterModel& parameters, ModelRunner& runner, ProcessLauncher& launcher) {
+  const SearchSpace& space = parameters.searchSpace();
+  printParameters(parameters, "Initial values", space.initial);
+  const auto violation = parameters.feasibility().violation(space.initial);
+  if (violation && config_.task) {
+    const std::string what = "They cannot be run, and this task does without them: " + *violation;
+    if (!config_.task->earlierResultFile().empty()) {
+      print(what + "\nThe model is not run: the evaluations are those of an earlier run");
+      return;
+    }
+    if (const auto set = config_.task->trialSet(space, parameters.feasibility())) {
+      print(what);
+      printParameters(parameters, "Values of a set of the task, with which the model is run instead", *set);
+      return judgeRun(runner, launcher, *set, "these values");
+    }
+  }
+  judgeRun(runner, launcher, space.initial, "the initial values");
 }
 
 /// Of a task that judges the evaluations of an earlier run.
@@ -120,10 +144,11 @@ void SetupCheck::checkEarlierResults(const SearchSpace& space, std::span<const O
   for (const std::string& text : earlier.warnings) log_.warning(text);
 }
 
-void SetupCheck::judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set) {
+void SetupCheck::judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set,
+                          std::string_view what) {
   const double began = runTimeClock();
   const EvaluationResult result = resultOf(runner, launcher, set);
-  print(fmt::format("It took {:.2f} s, with the reading of its results", runTimeClock() - began));
+  if (isRun_) print(fmt::format("It took {:.2f} s, with the reading of its results", runTimeClock() - began));
   for (const std::string& text : result.warnings) log_.warning(text);
   for (const FileDoubt& doubt : result.doubts) log_.warning(doubt.text);
   for (const UnusedObservations& unused : result.unusedObservations) log_.warning(unused.text);
@@ -131,13 +156,16 @@ void SetupCheck::judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::s
   if (result.ok()) return printResult(result, runner);
   std::string detail = result.failure->reason;
   for (const std::string& line : result.failure->lastOutput) detail += "\n   " + line;
-  fatalError(
-      fmt::format("Error: The evaluation of the initial values failed: {}", failureKindName(result.failure->kind)),
-      detail);
+  fatalError(fmt::format("Error: The evaluation of {} failed: {}", what, failureKindName(result.failure->kind)),
+             detail);
 }
 
 EvaluationResult SetupCheck::resultOf(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set) {
-  if (auto failure = runner.prepareModelRun(set, 1, 1)) return runner.failedResult(std::move(*failure));
+  if (auto failure = runner.prepareModelRun(set, 1, 1)) {
+    isRun_ = false;
+    return runner.failedResult(std::move(*failure));
+  }
+  print(fmt::format("The model is run in {}", launcher.getProcessFolder(1)));
   for (std::int32_t executing = 1, status = 0; executing != 0;) {
     launcher.isExecuting(1, executing, status);
     if (executing != 0) launcher.waitForChange(kPollSeconds);
@@ -145,10 +173,10 @@ EvaluationResult SetupCheck::resultOf(ModelRunner& runner, ProcessLauncher& laun
   return runner.collect(1);
 }
 
-void SetupCheck::printParameters(ParameterModel& parameters) {
+void SetupCheck::printParameters(ParameterModel& parameters, std::string_view title, std::span<const double> set) {
   const SearchSpace& space = parameters.searchSpace();
-  const std::vector<double> values = ToModelScale(space, space.initial);
-  print("Initial values:");
+  const std::vector<double> values = ToModelScale(space, set);
+  print(fmt::format("{}:", title));
   for (std::size_t i = 0; i < space.size(); ++i) {
     print(fmt::format("   {} = {}", space.names[i], formatReal(values[i])));
   }

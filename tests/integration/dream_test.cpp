@@ -198,6 +198,11 @@ TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
       {"Likelihood = 'heteroscedastic'\n Error_Share = -1.0, 1.0", "Error_Share: expected 0 or more, found -1"},
       {"Likelihood = 'AR(1)'\n Error_Correlation = 0.5, 1.0", "expected 0 to 0.9999, found 1"},
       {"Likelihood = 'objective'\n Objective_Function = 2", "Objective_Function: expected 0 to 1, found 2"},
+      {"Likelihood = 'objective'\n Objective_Function = 'fitt'",
+       "Objective_Function: expected 0 to 1 or the name of an objective function, \"fit\"; found \"fitt\""},
+      {"Likelihood = 'objective'\n [ERROR_MODEL_1]\n [/ERROR_MODEL_1]", "remove the section ERROR_MODEL_1"},
+      {"Likelihood = 'normal'\n [ERROR_MODEL_1]\n Likelihood = 'objective'\n [/ERROR_MODEL_1]",
+       "can only be the whole likelihood, that of DREAM"},
       {"Likelihood = 'normal'\n [ERROR_MODEL_2]\n Likelihood = 'Student'\n [/ERROR_MODEL_2]",
        "ERROR_MODEL_2: expected the number of an output measure"},
       {"Likelihood = 'Box-Cox'\n Box_Cox_Shift = -6.0", "expected a Box_Cox_Shift with which all observations", false},
@@ -253,6 +258,30 @@ TEST(Dream, PriorsThatHaveNothingWithinTheBoundsAreRefusedAndOthersAreCutThere) 
   EXPECT_NEAR(dreamCell(posterior, "a", "Prior 95 %"), 9.5, 0.1);
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("PARAMETER_1: a, mean 5, standard deviation 100"));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("% of the values drawn are outside"));
+
+  // On a range that does not begin at 0, numbers are too coarse for a peak without end.
+  const struct {
+    const char* alpha;
+    const char* beta;
+    const char* told;
+  } peaks[] = {{"0.1", "1.0", "at its lower end, 2 (search scale)"},
+               {"1.0", "0.1", "at its upper end, 10 (search scale)"},
+               {"0.5", "0.5", nullptr}};
+  for (const auto& [alpha, beta, told] : peaks) {
+    withPrior("5.0", "1.0");
+    folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 2.0");
+    folder.editSetup(" Mean_Value = 5.0\n Standard_Deviation = 1.0",
+                     fmt::format("Distribution = 'beta'\nAlpha = {}\nBeta = {}", alpha, beta));
+    folder.editSetup("[DREAM]", "Redraw_Infeasible = 1\n[DREAM]");
+    const ProgramResult peaked = runProgram({"--check", folder / "basin.kdx"});
+    EXPECT_EQ(peaked.exitCode, 0) << peaked.error;
+    EXPECT_THAT(peaked.output, HasSubstr("Redraw_Infeasible: has no effect with Uncertainty_Type = 'DREAM'"));
+    if (told == nullptr) {
+      EXPECT_THAT(peaked.output, Not(HasSubstr("rounding of numbers")));
+    } else {
+      EXPECT_THAT(peaked.output, HasSubstr(std::string("of a lies within the rounding of numbers ") + told));
+    }
+  }
 
   writeDream(folder, {.maxEvaluations = 200}, dream);
   folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 4.0");

@@ -168,11 +168,12 @@ TEST(Glue, OfTheFilesOfAnEarlierRunNeedsNoModelRun) {
                                   HasSubstr("\n40 evaluations are taken from ")));
   const std::string values = folder.read("first_Simulated.bin");
   folder.useScript("exit 1");
-  folder.writeGlue(keywords + "\nEarlier_Result_File = 'first.dat'");
+  folder.writeGlue(keywords + "\nEarlier_Result_File = 'first.dat'", {.slots = 4});
   const ProgramResult run = runProgram({folder / "basin.kdx"});
   ASSERT_EQ(run.exitCode, 0) << run.error;
   EXPECT_EQ(folder.found(), found);
   EXPECT_THAT(run.error, Not(HasSubstr("Nothing was run")));
+  EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("can be used by the evaluations"))) << "there are none";
   EXPECT_THAT(folder.read("basin.log"), AllOf(HasSubstr("\n40 evaluations are taken from "),
                                               HasSubstr("\n0 model evaluations, 0 of them failed\n")));
   EXPECT_EQ(folder.read("first.dat"), keptResults);
@@ -308,6 +309,10 @@ TEST(Glue, RefusesSetupsThatDoNotSayWhatIsAcceptable) {
     EXPECT_EQ(run.exitCode, 1) << keywords;
     EXPECT_THAT(run.error, HasSubstr(text)) << keywords;
   }
+  folder.writeGlue("Behavioural_Share = 0.1");
+  folder.editSetup("[GLUE]\nBehavioural_Share = 0.1\n    [/GLUE]", "");
+  EXPECT_THAT(runProgram({folder / "basin.kdx"}).error,
+              HasSubstr("in [UNCERTAINTY_ESTIMATION]:\n   [GLUE]\n     Behavioural_Share = ...\n   [/GLUE]\n"));
 }
 
 }  // namespace

@@ -133,6 +133,49 @@ TEST(SetupCheck, SaysWhatIsWrong) {
   }
 }
 
+TEST(SetupCheck, RunsASetOfTheTaskWhereInitialValuesThatItDoesWithoutCannotBeRun) {
+  struct Case {
+    int option;
+    const char* from;
+    const char* to;
+    const char* told;
+    const char* error = "";
+  };
+  constexpr const char* kInstead =
+      "   a = 4\n   b = 1\n   c = 1 (fixed)\nThey cannot be run, and this task does without";
+  const Case cases[] = {
+      {1, "Sensitivity_Type = 0", "Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 32\n[/SOBOL]",
+       " of 128 sets of the design are not run and fail"},
+      {1, "Sensitivity_Type = 0", "Sensitivity_Type = 'Morris'", kInstead},
+      {3, "", "", kInstead},
+      {3, "Uncertainty_Type = 1", "Uncertainty_Type = 1\nRedraw_Infeasible = 1", kInstead},
+      {3, "Uncertainty_Type = 1", "Uncertainty_Type = 'GLUE'\n[GLUE]\nBehavioural_Share = 0.5\n[/GLUE]", kInstead},
+      {3, "Uncertainty_Type = 1", "Uncertainty_Type = 'DREAM'\n[DREAM]\nLikelihood = 'normal'\n[/DREAM]", kInstead},
+      {0, "", "", "Warning: ", "The evaluation of the initial values failed: parameter constraints violated\n"},
+      {1, "", "", "", "The evaluation of the initial values failed: parameter constraints violated\n"},
+  };
+  for (const Case& each : cases) {
+    SCOPED_TRACE(each.to);
+    const ModelFolder folder;
+    const std::string setup = folder.writeSetup({.option = each.option, .maxEvaluations = 80});
+    folder.editSetup(each.from, each.to);
+    folder.editSetup("TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+                     "TqSEKdxListItemCount = 1\n[CONSTRAINT_1]\nLeft_Equation = '6'\nRight_Equation = 'a + b'\n"
+                     "Logical_Operator = 0\n[/CONSTRAINT_1]\n[/INTERNAL_CONSTRAINTS]");
+    const FolderState before = stateOf(folder);
+    const ProgramResult result = check(setup);
+    const bool isFault = each.error[0] != '\0';
+    EXPECT_EQ(result.exitCode, isFault ? 1 : 0) << result.error;
+    EXPECT_THAT(result.output, HasSubstr(each.told));
+    if (!isFault) {
+      EXPECT_THAT(result.output, HasSubstr("Aggregate: "));
+    }
+    EXPECT_THAT(result.error, AllOf(HasSubstr(each.error), Not(HasSubstr("was run"))));
+    EXPECT_FALSE(folder.exists("basin_Check_Process1"));
+    EXPECT_TRUE(stateOf(folder) == before);
+  }
+}
+
 TEST(SetupCheck, LeavesARunInProgressAloneAndHasAFolderOfItsOwn) {
   const ModelFolder folder;
   const std::string setup = folder.writeSetup({.option = 0});

@@ -187,7 +187,11 @@ TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
   located.observation.fileLocation = "s.kdx:7:9: File_Name: ";
   OutputMeasure withItem = measure("sim.csv", "obs.csv", 3);
   withItem.simulation.itemLocation = "s.kdx:8:9: Item_No: ";
+  OutputMeasure unwritten = measure("gone.csv", "obs.csv");
+  unwritten.simulation.isOfModel = true;
   const std::tuple<OutputMeasure, std::string, std::string> cases[] = {
+      {unwritten, "Error opening TS object for file: " + folder_ / "gone.csv",
+       ": No such file or directory\nThe model writes it: run the model once in its own folder"},
       {withItem, "Error: Item No. 3 not found in " + folder_ / "sim.csv", "\ns.kdx:8:9: Item_No: the file has 2 items"},
       {measure("gone.csv", "obs.csv"), "Error opening TS object for file: " + folder_ / "gone.csv",
        folder_ / "gone.csv" + ": No such file or directory"},

@@ -70,6 +70,7 @@ const SettingSection<GlueSettings>& glueSection() {
                  .defaultValue = kNoDefault,
                  .meaning = "In place of a threshold: the share of the successful evaluations, the best of them, "
                             "that is behavioural. Equally good ones at the limit all are.",
+                 .isOfNewSection = true,
                  .bearsOnResults = kNotOfResults}),
             [](const GlueSettings& settings) -> std::optional<SettingRefusal> {
               if (auto refusal = validateBehavioural(settings)) return refusal;

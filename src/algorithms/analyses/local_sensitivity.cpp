@@ -11,6 +11,7 @@
 
 #include "algorithms/analyses/compared_observations.h"
 #include "common/run_files.h"
+#include "common/short_list.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -110,24 +111,22 @@ void noteIncomparable(const IncomparableOutputs& incomparable, const Sensitivity
   for (std::size_t j = 0; j < plan.differences.size(); ++j) {
     ParameterDifference& difference = plan.differences[j];
     for (const bool isUnknown : {false, true}) {
-      std::string list;
+      ShortList list(kMostNamed);
       std::string reason;
-      std::size_t count = 0;
       for (std::size_t i = 0; i < names.size() && difference.problem.empty(); ++i) {
         const auto& below = incomparable[difference.minus];
         const auto& ofRun = below.empty() || below[i].empty() ? incomparable[difference.plus] : below;
         if (ofRun.empty() || ofRun[i].empty() || isUnknown != std::isnan(measures.derivatives[j][i])) continue;
         if (reason.empty()) reason = ofRun[i];
-        if (++count <= kMostNamed) list += fmt::format("{}{}", count == 1 ? "" : ", ", quotedForMessage(names[i].name));
+        list.add(quotedForMessage(names[i].name));
       }
-      if (count == 0) continue;
-      if (count > kMostNamed) list += fmt::format(" and {} more", count - kMostNamed);
-      const std::string_view pronoun = count == 1 ? "it" : "them";
+      if (list.isEmpty()) continue;
+      const std::string_view pronoun = list.count() == 1 ? "it" : "them";
       difference.warnings.push_back(
-          isUnknown
-              ? fmt::format("it has no derivatives of {} and of objective functions with {}: {}", list, pronoun, reason)
-              : fmt::format("its differences of {} and of objective functions with {} are one-sided: {}", list, pronoun,
-                            reason));
+          isUnknown ? fmt::format("it has no derivatives of {} and of objective functions with {}: {}", list.text(),
+                                  pronoun, reason)
+                    : fmt::format("its differences of {} and of objective functions with {} are one-sided: {}",
+                                  list.text(), pronoun, reason));
     }
   }
 }

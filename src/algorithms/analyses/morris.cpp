@@ -134,8 +134,7 @@ DataTable morrisTable(const MorrisOutcome& outcome, const MorrisSettings& settin
       "Share: mu* over the largest mu* of the output. Certainty: that the share is below Negligible. TopStability: "
       "share of the bootstrap samples with the same parameters, TopCount in number, in front. FixedTogether: certainty "
       "that all shares of those with the verdict fix are negligible. Both certainties say nothing of parameters "
-      "without any "
-      "effect, MuStar 0"};
+      "without any effect, MuStar 0"};
   table.columns = {"Kind",         "Name",          "Parameter",   "Mu",      "MuLower",    "MuUpper",
                    "MuStar",       "MuStarLower",   "MuStarUpper", "Sigma",   "SigmaLower", "SigmaUpper",
                    "Share",        "ShareLower",    "ShareUpper",  "Effects", "Rank",       "RankLower",

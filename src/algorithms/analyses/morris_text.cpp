@@ -7,6 +7,7 @@
 
 #include "algorithms/analyses/morris.h"
 #include "algorithms/numbers/sample_summary.h"
+#include "common/short_list.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -34,15 +35,12 @@ std::string surenessText(double certainty, int samples) {
 
 /// Behind "No parameter changes it": those of which that is not known.
 std::string unknownEffects(const OutputEffects& effects, std::span<const std::string> names) {
-  std::size_t count = 0;
-  std::string unknown;
+  ShortList unknown(kMostNamed);
   for (std::size_t j = 0; j < effects.parameters.size(); ++j) {
-    if (effects.parameters[j].count > 0) continue;
-    if (count++ < kMostNamed) unknown += (unknown.empty() ? "" : ", ") + names[j];
+    if (effects.parameters[j].count == 0) unknown.add(names[j]);
   }
-  if (count == 0) return {};
-  if (count > kMostNamed) unknown += fmt::format(" and {} more", count - kMostNamed);
-  return " as far as effects are known; there is none of " + unknown;
+  if (unknown.isEmpty()) return {};
+  return " as far as effects are known; there is none of " + unknown.text();
 }
 
 struct Texts {
@@ -93,15 +91,12 @@ void Texts::appendTable(const ScreenedOutput& output, std::span<const std::size_
 
 void Texts::appendVerdicts(const ScreenedOutput& output, std::span<const std::size_t> order) {
   const auto list = [&](ScreeningVerdict verdict, bool isFromLast, const auto& textOf) {
-    std::string text;
-    std::size_t count = 0;
+    ShortList found(kMostNamed);
     for (std::size_t k = 0; k < order.size(); ++k) {
       const std::size_t j = order[isFromLast ? order.size() - 1 - k : k];
-      if (output.effects.parameters[j].verdict != verdict) continue;
-      if (++count <= kMostNamed) text += (count == 1 ? "" : ", ") + textOf(j);
+      if (output.effects.parameters[j].verdict == verdict) found.add(textOf(j));
     }
-    if (count > kMostNamed) text += fmt::format(" and {} more", count - kMostNamed);
-    return std::pair(count, text);
+    return std::pair(found.count(), found.text());
   };
   const auto ofParameter = [&](std::size_t j) -> const ParameterEffects& { return output.effects.parameters[j]; };
   const auto [fixed, fixable] = list(ScreeningVerdict::fix, true, [&](std::size_t j) {
@@ -161,19 +156,17 @@ void Texts::appendRanking(const ScreenedOutput& output) {
 
 /// Of a few effects the largest may well be most of the sum.
 void Texts::appendSingleEffects(const ScreenedOutput& output, std::span<const std::size_t> order) {
-  std::string parameters;
-  std::size_t count = 0;
+  ShortList parameters(kMostNamed);
   for (const std::size_t j : order) {
     const ParameterEffects& p = output.effects.parameters[j];
     if (p.count < kFewestEffects || !(p.largestPart > kNearlyAll) || p.share.value < settings.negligibleShare) continue;
-    if (++count <= kMostNamed) parameters += (count == 1 ? "" : ", ") + names.parameters[j];
+    parameters.add(names.parameters[j]);
   }
-  if (count == 0) return;
-  if (count > kMostNamed) parameters += fmt::format(" and {} more", count - kMostNamed);
+  if (parameters.isEmpty()) return;
   lines.push_back(
       fmt::format("Warning: A single effect on {} makes more than 90 % of the mu* of {}: see whether the value of that "
                   "run is what the model should yield. Other points may give another mu*",
-                  output.name, parameters));
+                  output.name, parameters.text()));
 }
 
 void appendStepProblems(const EffectPlan& plan, const AnalysisNames& names, std::vector<std::string>& lines) {

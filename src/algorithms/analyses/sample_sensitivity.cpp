@@ -15,6 +15,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/numbers/sample_summary.h"
+#include "common/short_list.h"
 
 namespace mirevo {
 namespace {
@@ -200,6 +201,10 @@ std::size_t bootstrapCount(std::size_t rows, std::size_t parameters, std::size_t
 void addFirstOrder(const std::vector<Order>& orders, const Columns& outputs, std::int32_t seed,
                    std::span<OutputDependence*> found) {
   WeightedOutputs weighted(outputs);
+  for (std::size_t q = 0; q < found.size(); ++q) {
+    const double variance = weighted.sumOfSquares(q);
+    found[q]->hasVariance = std::isfinite(variance) && variance > 0.0;
+  }
   const std::size_t n = weighted.rowCount();
   const FirstOrder firstOrder(n);
   const auto isVaried = [&](std::size_t j) { return orders[j].ends.size() > 1; };
@@ -245,7 +250,11 @@ void addDependences(const Columns& parameters, const std::vector<std::size_t>& r
                     std::int32_t seed, std::span<OutputDependence*> found) {
   Columns outputRanks;
   outputRanks.reserve(outputs.size());
-  for (const std::vector<double>& output : outputs) outputRanks.push_back(ranksOf(orderOf(output)));
+  for (std::size_t q = 0; q < outputs.size(); ++q) {
+    const Order order = orderOf(outputs[q]);
+    found[q]->isConstant = order.ends.size() == 1;
+    outputRanks.push_back(ranksOf(order));
+  }
   std::vector<Order> orders;
   for (std::size_t j = 0; j < parameters.size(); ++j) {
     std::vector<double> values;
@@ -279,28 +288,23 @@ std::vector<std::size_t> byImportance(const OutputDependence& output) {
 void appendJudgement(const OutputDependence& output, const AnalysisNames& names, std::vector<std::string>& lines) {
   constexpr double kNegligible = 0.05;
   constexpr double kWide = 0.1;
-  std::string negligible;
-  std::string constant;
-  std::size_t others = 0;
-  std::size_t constants = 0;
-  const auto add = [&](std::string& list, std::size_t& count, std::size_t j) {
-    if (count++ < kMostShownParameters) list += (list.empty() ? "" : ", ") + names.parameters[j];
-  };
+  ShortList negligible(kMostShownParameters);
+  ShortList constant(kMostShownParameters);
   double widest = 0.0;
   for (std::size_t j = 0; j < output.parameters.size(); ++j) {
     const SampleDependence& one = output.parameters[j];
     widest = std::fmax(widest, 0.5 * (one.upper - one.lower));
-    if (!one.isVaried) add(constant, constants, j);
-    if (one.upper < kNegligible) add(negligible, others, j);
+    if (!one.isVaried) constant.add(names.parameters[j]);
+    if (one.upper < kNegligible) negligible.add(names.parameters[j]);
   }
-  if (others > kMostShownParameters) negligible += fmt::format(" and {} more", others - kMostShownParameters);
-  if (constants > kMostShownParameters) constant += fmt::format(" and {} more", constants - kMostShownParameters);
-  if (!constant.empty()) lines.push_back("   Not varied in this sample, which says nothing of them: " + constant);
-  if (!negligible.empty()) {
+  if (!constant.isEmpty()) {
+    lines.push_back("   Not varied in this sample, which says nothing of them: " + constant.text());
+  }
+  if (!negligible.isEmpty()) {
     lines.push_back(
         fmt::format("   Less than {:g} of the variance each, by themselves: {}; what they do together with "
                     "others does not show here",
-                    kNegligible, negligible));
+                    kNegligible, negligible.text()));
   }
   if (widest > kWide) {
     lines.push_back(
@@ -399,7 +403,11 @@ std::vector<std::string> formatSampleSensitivity(const SampleSensitivity& sensit
     for (std::string& line : formatTable("Dependence of " + output.name, headings, shown, rows)) {
       lines.push_back(std::move(line));
     }
-    if (hasIndices) {
+    if (hasIndices && output.isConstant) {
+      lines.emplace_back("   No indices: all runs have the same value");
+    } else if (hasIndices && !output.hasVariance) {
+      lines.push_back(fmt::format("   No first-order indices: {}", kNoFiniteVariance));
+    } else if (hasIndices) {
       appendJudgement(output, names, lines);
     } else {
       lines.push_back(fmt::format("   {} runs with a value are too few for first-order indices, at least {}",

@@ -31,6 +31,8 @@ struct OutputDependence {
   std::string kind;  ///< "measure" or "objective"
   std::string name;
   std::size_t count = 0;                     ///< runs
+  bool isConstant = false;                   ///< all have the same value
+  bool hasVariance = true;                   ///< one that is a number and not 0, as indices need
   std::vector<SampleDependence> parameters;  ///< in setup order
 };
 
@@ -41,6 +43,11 @@ struct SampleSensitivity {
 
 /// A sample with fewer runs has no first-order indices.
 inline constexpr std::size_t kLeastForIndices = 100;
+
+/// Why an output has no indices whose values are so large, or differ so little, that squares of differences leave the
+/// range of numbers.
+inline constexpr std::string_view kNoFiniteVariance =
+    "the variance of its values is not a finite number: they are as large as 1e150, or as small as 1e-150";
 
 /// What a sample tells of its parameters without a further model run. First-order indices are those of Plischke (2012),
 /// doi:10.1016/j.envsoft.2012.03.004 (the outputs, in the order of a parameter's values, are projected on the first

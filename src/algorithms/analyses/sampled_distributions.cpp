@@ -1,5 +1,6 @@
 #include "algorithms/analyses/sampled_distributions.h"
 
+#include <algorithm>
 #include <cmath>
 
 #include <fmt/format.h>
@@ -123,18 +124,21 @@ std::string shareWarning(const Distribution& distribution, const SearchSpace& sp
 }  // namespace
 
 std::vector<std::string> distributionLines(const ParameterDistributions& distributions, const SearchSpace& space,
-                                           std::string_view section) {
+                                           std::string_view section, std::size_t most) {
   bool areNormal = true;
   for (std::size_t j = 0; j < distributions.size(); ++j) {
     areNormal = areNormal && isNormalOnSearchScale(distributions[j]);
   }
   std::vector<std::string> lines{fmt::format("{}: PARAMETER_n of {} is that of the n-th variable parameter",
                                              areNormal ? "Normal distributions" : "Distributions", section)};
-  for (std::size_t j = 0; j < distributions.size(); ++j) {
+  for (std::size_t j = 0; j < std::min(distributions.size(), most); ++j) {
     lines.push_back(distributionLine(distributions[j], space, j));
     if (!isInteger(space, j) || !isNormalOnSearchScale(distributions[j])) continue;
     const double mean = distributions[j].quantile(0.5);
     lines.push_back(integerLine(space, j, mean) + belowBoundText(space, j, distributions[j].quantile(0.05)));
+  }
+  if (distributions.size() > most) {
+    lines.push_back(fmt::format("  and those of {} more parameters", distributions.size() - most));
   }
   if (!distributions.copula()) return lines;
   const std::vector<std::vector<double>>& correlations = distributions.copula()->correlations();

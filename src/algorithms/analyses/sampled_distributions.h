@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <limits>
 #include <span>
 #include <string>
 #include <string_view>
@@ -13,9 +14,11 @@
 namespace mirevo {
 
 /// What the log says of the distributions before the run: which one each parameter has, on the search scale and on the
-/// model scale, and which mean centres an integer parameter on a value. `section` has them.
+/// model scale, and which mean centres an integer parameter on a value. `section` has them. Of more parameters than
+/// `most` those of the first are told, and how many there are more.
 std::vector<std::string> distributionLines(const ParameterDistributions& distributions, const SearchSpace& space,
-                                           std::string_view section);
+                                           std::string_view section,
+                                           std::size_t most = std::numeric_limits<std::size_t>::max());
 
 /// One warning per distribution whose mean, that of a normal distribution, is outside the search bounds, or most of
 /// whose values are.

@@ -7,8 +7,10 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sample_sensitivity.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "common/run_files.h"
+#include "common/short_list.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -41,15 +43,13 @@ std::vector<std::size_t> descending(std::span<const SobolIndex> indices) {
 /// "a (0.1 to 0.2), b (0.01 to 0.3) and 3 more"
 std::string namesWithLimits(std::span<const std::string> names, std::span<const SobolIndex> indices,
                             std::span<const std::size_t> chosen) {
-  std::string text;
-  for (std::size_t i = 0; i < std::min(chosen.size(), kMostNames); ++i) {
-    const SobolIndex& index = indices[chosen[i]];
+  ShortList list(kMostNames);
+  for (const std::size_t i : chosen) {
+    const SobolIndex& index = indices[i];
     const bool isInert = index.value == 0.0 && index.lower == 0.0 && index.upper == 0.0;
-    text += fmt::format("{}{} ({})", i == 0 ? "" : ", ", names[chosen[i]],
-                        isInert ? "no effect in any block" : limitsText(index));
+    list.add(fmt::format("{} ({})", names[i], isInert ? "no effect in any block" : limitsText(index)));
   }
-  if (chosen.size() > kMostNames) text += fmt::format(" and {} more", chosen.size() - kMostNames);
-  return text;
+  return list.text();
 }
 
 std::vector<std::string> factorNames(const SobolFindings& findings) {
@@ -76,8 +76,7 @@ std::string whyNoIndices(const SobolIndices& indices) {
   if (indices.valueCount < 2) return "no indices, too few runs succeeded";
   if (indices.isConstant) return "no parameter has an influence, all runs have the same value";
   if (hasVariance(indices)) return "";
-  return "no indices, the variance of its values is not a finite number: they are as large as 1e150, or as small as "
-         "1e-150";
+  return fmt::format("no indices, {}", kNoFiniteVariance);
 }
 
 /// "2 of the 64 blocks make more than 90 % of the variance, and other points may give other indices"
@@ -370,8 +369,7 @@ std::vector<std::string> sobolWarnings(const SobolFindings& findings) {
     warnings.push_back(fmt::format(
         "{:.0f} % of the model runs failed. Failures at random widen the limits alone, but if they come with certain "
         "parameter values, the indices are those of the rest of the ranges: the failures may tell which, and narrower "
-        "ranges avoid "
-        "them",
+        "ranges avoid them",
         100.0 * failed));
   }
   return warnings;

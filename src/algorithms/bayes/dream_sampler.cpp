@@ -7,6 +7,8 @@
 #include <numeric>
 #include <utility>
 
+#include <fmt/format.h>
+
 #include "algorithms/bayes/chain_diagnostics.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "common/fatal_error.h"
@@ -23,7 +25,6 @@ constexpr std::size_t kFirstCheck = 50;             // generations behind burn-i
 constexpr double kCheckGrowth = 1.3;
 constexpr double kLeastValues = 1000.0;  // of a chain, that a check looks at if there are so many
 constexpr double kValuesPerDraw = 4.0;   // all chains together, for each independent draw that is wanted
-constexpr int kMostDraws = 100000;       // for one prior draw that is allowed
 
 /// The place in [lower, upper) at which a way that leaves it on one side and comes in on the other ends.
 double folded(double value, double lower, double upper) {
@@ -33,7 +34,24 @@ double folded(double value, double lower, double upper) {
   return std::clamp(lower + (rest < 0.0 ? rest + width : rest), lower, upper);
 }
 
+bool isWithin(const DreamProblem& problem, std::span<const double> point) {
+  for (std::size_t j = 0; j < point.size(); ++j) {
+    if (!(point[j] >= problem.lower[j] && point[j] <= problem.upper[j])) return false;
+  }
+  return true;
+}
+
 }  // namespace
+
+std::optional<std::vector<double>> drawAllowed(const DreamProblem& problem, ChainRandom& random) {
+  std::vector<double> unit(problem.lower.size());
+  for (int k = 0; k < kMostPriorDraws; ++k) {
+    for (double& value : unit) value = random.uniform();
+    std::vector<double> point = problem.drawPrior(unit);
+    if (isWithin(problem, point) && problem.logPrior(point) > -kInfinity) return point;
+  }
+  return std::nullopt;
+}
 
 void ChainHistory::add(const State& state) {
   points_.insert(points_.end(), state.point.begin(), state.point.end());
@@ -97,21 +115,14 @@ DreamSampler::DreamSampler(const DreamSettings& settings, DreamProblem problem, 
 }
 
 bool DreamSampler::isInside(std::span<const double> point) const {
-  for (std::size_t j = 0; j < point.size(); ++j) {
-    if (!(point[j] >= problem_.lower[j] && point[j] <= problem_.upper[j])) return false;
-  }
-  return true;
+  return isWithin(problem_, point);
 }
 
 std::vector<double> DreamSampler::drawAllowed() {
-  std::vector<double> unit(dimension());
-  for (int k = 0; k < kMostDraws; ++k) {
-    for (double& value : unit) value = random_.uniform();
-    std::vector<double> point = problem_.drawPrior(unit);
-    if (isInside(point) && problem_.logPrior(point) > -kInfinity) return point;
-  }
+  std::optional<std::vector<double>> point = mirevo::drawAllowed(problem_, random_);
+  if (point) return *std::move(point);
   fatalError("Error: No parameter set found in the prior that can be run",
-             "none of 100000 draws lies within the bounds and meets the constraints");
+             fmt::format("none of {} draws lies within the bounds and meets the constraints", kMostPriorDraws));
 }
 
 void DreamSampler::addToArchive(ArchiveMember member) {

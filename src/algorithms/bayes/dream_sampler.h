@@ -61,6 +61,11 @@ struct DreamProblem {
   std::function<std::vector<ProposalResult>(std::span<const DreamProposal>)> evaluate;
 };
 
+inline constexpr int kMostPriorDraws = 100'000;
+
+/// A draw from the prior that lies within the bounds and has a density; empty if none of kMostPriorDraws is one.
+std::optional<std::vector<double>> drawAllowed(const DreamProblem& problem, ChainRandom& random);
+
 /// The states of all chains, generation by generation. A rejected proposal repeats the state before it.
 class ChainHistory final {
  public:

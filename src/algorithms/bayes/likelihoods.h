@@ -54,6 +54,10 @@ struct ErrorTermRow {
 };
 const std::array<ErrorTermRow, kErrorTermCount>& errorTermRows();
 
+/// The default bounds of the deviation, times the standard deviation of the observations.
+inline constexpr double kLeastDeviation = 1e-3;
+inline constexpr double kMostDeviation = 10.0;
+
 /// Whether a form of the likelihood has the term without being asked for it.
 bool hasTerm(LikelihoodForm form, ErrorTerm term);
 

@@ -3,7 +3,9 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdint>
+#include <functional>
 #include <limits>
+#include <numeric>
 #include <utility>
 
 #include <fmt/format.h>
@@ -17,6 +19,7 @@ namespace mirevo {
 namespace {
 
 constexpr std::size_t kBins = 40;
+constexpr std::size_t kMostListed = 50;  // dimensions in the table of the log
 
 /// Calls `take(state)` for each state behind burn-in.
 template <class Take>
@@ -97,13 +100,28 @@ void appendCounts(const DreamSampler& sampler, std::vector<std::string>& lines) 
   }
 }
 
+/// All dimensions, or of many those of whose priors least is left, in their order.
+std::vector<std::size_t> mostNarrowed(std::span<const DimensionFigures> figures) {
+  std::vector<std::size_t> order(figures.size());
+  std::iota(order.begin(), order.end(), std::size_t{0});
+  if (order.size() <= kMostListed) return order;
+  const auto key = [&](std::size_t j) { return std::isnan(figures[j].narrowing) ? INFINITY : figures[j].narrowing; };
+  std::ranges::stable_sort(order, std::less(), key);
+  order.resize(kMostListed);
+  std::ranges::sort(order);
+  return order;
+}
+
 void appendQuantiles(const ShownDimensions& dimensions, const PosteriorSummary& summary,
+                     std::span<const DimensionFigures> figures, std::string_view file,
                      std::vector<std::string>& lines) {
   std::vector<std::string> headings{"Mean", "Std. deviation"};
   for (const double p : kSummaryProbabilities) headings.push_back(fmt::format("{:g} %", 100.0 * p));
   headings.insert(headings.end(), {"Most probable", "R-hat", "Eff. size"});
   std::vector<std::vector<double>> rows;
-  for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
+  std::vector<std::string> names;
+  for (const std::size_t j : mostNarrowed(figures)) {
+    names.push_back(dimensions.names[j]);
     const PosteriorSummary::Dimension& own = summary.dimensions[j];
     std::vector<double> row{own.mean, own.standardDeviation};
     row.insert(row.end(), own.quantiles.begin(), own.quantiles.end());
@@ -111,7 +129,11 @@ void appendQuantiles(const ShownDimensions& dimensions, const PosteriorSummary& 
     rows.push_back(std::move(row));
   }
   lines.emplace_back();
-  for (std::string& line : formatTable("Posterior", headings, dimensions.names, rows)) lines.push_back(std::move(line));
+  for (std::string& line : formatTable("Posterior", headings, names, rows)) lines.push_back(std::move(line));
+  if (const std::size_t left = figures.size() - names.size(); left > 0) {
+    lines.push_back(fmt::format("   The other {} of {} parameters, which the data have narrowed less, are in {}", left,
+                                figures.size(), file));
+  }
   lines.push_back(fmt::format("The most probable state is that of evaluation {}", summary.mostProbableRun));
 }
 
@@ -299,7 +321,7 @@ DataTable convergenceTable(const DreamSampler& sampler, const ShownDimensions& d
 
 std::vector<std::string> formatPosterior(const DreamSettings& settings, const DreamSampler& sampler,
                                          const ShownDimensions& dimensions, const PosteriorSummary* summary,
-                                         int failures, std::string_view correlationFile) {
+                                         int failures, const PosteriorFiles& files) {
   const ChainHistory& history = sampler.history();
   std::vector<std::string> lines{fmt::format("DREAM(ZS): {} chains, {} generations, {}", history.chainCount(),
                                              history.generations(),
@@ -322,10 +344,10 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
   const std::vector<DimensionFigures> figures = figuresOf(dimensions, *summary);
   appendConvergence(settings, figures, lines);
   appendCounts(sampler, lines);
-  appendQuantiles(dimensions, *summary, lines);
+  appendQuantiles(dimensions, *summary, figures, files.posterior, lines);
   const ConvergenceLimits limits{settings.rHatLimit, settings.effectiveSize};
   if (convergenceWords(figures, limits).state != Convergence::apart) appendTold(dimensions, *summary, figures, lines);
-  appendCorrelations(dimensions, *summary, correlationFile, lines);
+  appendCorrelations(dimensions, *summary, files.correlations, lines);
   return lines;
 }
 

@@ -56,9 +56,15 @@ DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dim
 /// R-hat and effective sample sizes each time that they were looked at.
 DataTable convergenceTable(const DreamSampler& sampler, const ShownDimensions& dimensions);
 
-/// The same in words, for the log. `failures`: proposals whose model run failed.
+/// The names of files that have what the log leaves out.
+struct PosteriorFiles {
+  std::string posterior;
+  std::string correlations;
+};
+
+/// The same in words, for the log, with at most 50 dimensions in a table. `failures`: proposals whose model run failed.
 std::vector<std::string> formatPosterior(const DreamSettings& settings, const DreamSampler& sampler,
                                          const ShownDimensions& dimensions, const PosteriorSummary* summary,
-                                         int failures, std::string_view correlationFile);
+                                         int failures, const PosteriorFiles& files);
 
 }  // namespace mirevo

@@ -9,6 +9,8 @@
 
 #include <fmt/format.h>
 
+#include "common/short_list.h"
+
 namespace mirevo {
 namespace {
 
@@ -28,12 +30,9 @@ bool hasFewDraws(const DimensionFigures& one, const ConvergenceLimits& limits) {
 
 /// "X4 (1.31), X1 (1.12)"
 std::string listed(std::span<const std::pair<std::string, std::string>> named) {
-  std::string text;
-  for (std::size_t i = 0; i < std::min(named.size(), kMostNamed); ++i) {
-    text += fmt::format("{}{} ({})", i == 0 ? "" : ", ", named[i].first, named[i].second);
-  }
-  if (named.size() > kMostNamed) text += fmt::format(" and {} more", named.size() - kMostNamed);
-  return text;
+  ShortList list(kMostNamed);
+  for (const auto& [name, figure] : named) list.add(fmt::format("{} ({})", name, figure));
+  return list.text();
 }
 
 /// Of the dimensions that `isMeant` holds for, those with the largest `badness` first; not a number is the worst.
@@ -99,10 +98,9 @@ ConvergenceWords convergenceWords(std::span<const DimensionFigures> dimensions, 
   if (!apart.empty()) {
     words.findings.push_back(
         fmt::format("The chains have not converged: R-hat is above {:g} for {}{}{}. The quantiles below are not those "
-                    "of the posterior "
-                    "yet. {}; where R-hat stays large, the posterior may have several peaks (more chains help: "
-                    "Chain_Count) or burn-in "
-                    "is too short (Burn_In_Share), which the states in _Chains.dat show; the run then begins anew",
+                    "of the posterior yet. {}; where R-hat stays large, the posterior may have several peaks (more "
+                    "chains help: Chain_Count) or burn-in is too short (Burn_In_Share), which the states in "
+                    "_Chains.dat show; the run then begins anew",
                     limits.rHat, listed(apart), few.empty() ? "" : ", and ", fewText, kGoOn));
   } else if (!few.empty()) {
     words.findings.push_back(fmt::format(

@@ -26,6 +26,7 @@ enum class KeywordType {
   integer,
   real,
   code,       ///< one of a few values, by its number or by its name between quotes
+  item,       ///< one of the items of a list of the setup, by its number or by its name between quotes
   name,       ///< text of at most kFieldWidth bytes that is not blank and has no tabs
   text,       ///< text of at most kFieldWidth bytes
   freeText,   ///< text of any length
@@ -35,7 +36,8 @@ enum class KeywordType {
   date
 };
 
-/// A value as read from the setup. That of a coded keyword is its number, or its name if it has no number.
+/// A value as read from the setup. That of a coded keyword is its number, or its name if it has no number; that of an
+/// item is what was written.
 using SetupValue = std::variant<std::int32_t, double, std::string, std::vector<double>, DateRecord>;
 
 /// Valid numbers of a keyword. NaN and infinity are never valid.
@@ -87,6 +89,8 @@ struct KeywordFacts {
   std::string_view refusal = {};
   std::string_view unit = {};
   std::string meaning = {};
+  bool isOfNewSection =
+      false;                   ///< it is optional, but in the lines of a section to be added, which needs it or another
   bool bearsOnResults = true;  ///< another value may change the results: a restart with one is refused
   int checkOrder = 0;          ///< values are checked in ascending order of this number, equal ones in reading order
 };
@@ -197,10 +201,11 @@ KeywordRow setting(KeywordFacts facts) {
   return memberSetting<Member>(Member, std::move(facts));
 }
 
-/// A coded row whose value is passed on as it was read, a number or a name: `take(settings, value)`.
+/// A row of a code or an item whose value is passed on as it was read, a number or a name: `take(settings, value)`.
 template <class Settings, class Take>
 KeywordRow choice(Take, KeywordFacts facts) {
-  return {std::move(facts), KeywordType::code,
+  const KeywordType type = facts.type.value_or(KeywordType::code);
+  return {std::move(facts), type,
           [](void* settings, const SetupValue& value) { Take{}(*static_cast<Settings*>(settings), value); }};
 }
 

@@ -37,6 +37,10 @@ std::string meaningOfCode(int status, const std::string& file) {
   if (head.find("\r\n") != std::string::npos) {
     text +=
         "; the lines of the file end in CR LF, of which a shell takes CR for part of a word: save it with LF line ends";
+  } else {
+    text += status == 127 ? "; the batch runs in the copy of its folder: name a program relative to that, or with its "
+                            "whole path"
+                          : "; a program needs chmod +x in the model's folder";
   }
   return text + ")";
 }

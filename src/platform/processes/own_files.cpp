@@ -87,8 +87,7 @@ std::vector<std::string> requireOwnFiles(const std::string& baseFolder, std::spa
     if (!link || requireCopyable(baseFolder + file, *link, {&baseFolder}) != fs::file_type::directory) continue;
     std::string text = fmt::format(
         "The link {} leads to {}, out of the model's folder. Every process folder has a copy of that folder in its "
-        "place, "
-        "as model runs write or read files of their own in it; the original stays as it is.",
+        "place, as model runs write or read files of their own in it; the original stays as it is.",
         link->link, link->target);
     if (std::find(told.begin(), told.end(), text) == told.end()) told.push_back(std::move(text));
   }

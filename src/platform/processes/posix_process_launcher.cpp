@@ -122,6 +122,19 @@ std::string textOf(const FatalError& error) {
   return error.detail().empty() ? error.message() : error.message() + "\n" + error.detail();
 }
 
+/// What to do where folders that are not there cannot be made, which the system's reason does not say; else empty.
+std::string remedyForFolders(const std::vector<std::string>& folders) {
+  for (const std::string& folder : folders) {
+    const std::string parent = std::filesystem::path(folder).parent_path();
+    if (::access(folder.c_str(), F_OK) == 0 || ::access(parent.c_str(), W_OK | X_OK) == 0) continue;
+    return fmt::format(
+        "\nProcessFolder in the section SimultaneousSimulations names another folder for the process folders, one that "
+        "can be written, or the permissions of {} need to be changed",
+        parent);
+  }
+  return {};
+}
+
 }  // namespace
 
 PosixProcessLauncher::~PosixProcessLauncher() {
@@ -243,12 +256,16 @@ void PosixProcessLauncher::makeFolders(const LauncherSettings& settings) {
   };
   look();
   const FolderListing listing = listFolder(baseFolder_, processFolderPrefix_, everyTenthOfSecond(look));
-  const FoldersMade made = makeProcessFolders(listing, folders, {ownFiles_, linksReadOnlyFiles_},
-                                              [&settings, &look](const FoldersMade& soFar) {
-                                                if (settings.tellOfFolders) settings.tellOfFolders(soFar);
-                                                look();
-                                              });
-  if (settings.tellOfFolders) settings.tellOfFolders(made);
+  try {
+    const FoldersMade made = makeProcessFolders(listing, folders, {ownFiles_, linksReadOnlyFiles_},
+                                                [&settings, &look](const FoldersMade& soFar) {
+                                                  if (settings.tellOfFolders) settings.tellOfFolders(soFar);
+                                                  look();
+                                                });
+    if (settings.tellOfFolders) settings.tellOfFolders(made);
+  } catch (const FatalError& error) {
+    fatalError(textOf(error) + remedyForFolders(folders));
+  }
 }
 
 void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int number,

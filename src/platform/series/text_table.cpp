@@ -244,8 +244,7 @@ void TextTable::noteCut(const TextLayout::Line& line) {
   if (!cut || cutCount_++ > 0) return;
   firstCut_ = fmt::format(
       "{}:{}: Column_Widths ends column {} before character {}, between {} and {}: it cuts a number, unless these are "
-      "two "
-      "without a blank between them",
+      "two without a blank between them",
       sourceName_, line.number, cut->column + 1, cut->character, quotedForMessage(cells_[cut->column]),
       quotedForMessage(cells_[cut->column + 1]));
 }

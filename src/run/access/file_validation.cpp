@@ -24,7 +24,8 @@ void validateFileExists(const std::string& path, std::string_view keyword, const
   const std::string fault = faultOfFile(path);
   if (fault.empty()) return;
   section.refuse(fmt::format("Error: The file {} does not exist", shown(path, keyword, section)), keyword,
-                 explained(path, fault));
+                 explained(path, fault) +
+                     "; expected the name of a file that is there, relative to the setup's folder or absolute");
 }
 
 void validateFileOpens(const std::string& path, std::string_view keyword, const SetupSection& section,

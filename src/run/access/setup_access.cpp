@@ -75,13 +75,13 @@ std::optional<std::string> nameInSetup(const KdxSection& target, std::string_vie
   return node->name();
 }
 
-/// A section as it is to be added, with the keywords that have no default and the first item of a list that needs one.
+/// A section as it is to be added, with the keywords that it needs and the first item of a list that needs one.
 std::string linesOfSection(std::string_view name, const SectionRow& row, const SetupSchema& schema,
                            const std::string& indent) {
   std::string lines = fmt::format("\n{}[{}]", indent, name);
   bool needsItem = false;
   for (const KeywordRow& keyword : row.keywords) {
-    if (!keyword.isRequired()) continue;
+    if (!keyword.isRequired() && !keyword.facts.isOfNewSection) continue;
     lines += fmt::format("\n{}  {} = ...", indent, keyword.name());
     needsItem = needsItem || keyword.name() == kItemCountKeyword;
   }

@@ -27,6 +27,8 @@ std::string_view wanted(KeywordType type) {
     case KeywordType::real:
     case KeywordType::realList:
       return "a number";
+    case KeywordType::item:
+      return "a number or a name between quotes";
     case KeywordType::date:
       return "a date such as 2001-01-31 or 2001-01-31 12:30";
     case KeywordType::name:
@@ -127,6 +129,9 @@ Converted convertOne(const KeywordRow& row, const KdxValue& value) {
     case KeywordType::integer:
       if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
       return mismatch(type, value);
+    case KeywordType::item:
+      if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
+      break;
     case KeywordType::real:
     case KeywordType::realList:
       if (const auto real = asReal(value)) return SetupValue(*real);

@@ -266,8 +266,7 @@ int RunResults::restorePairs(const RunConfig& config, const ResultRows& rows, Ea
   if (first != 0) {
     log.warning(
         fmt::format("{} does not have the pairs of evaluation No. {}, the first successful run, with which others are "
-                    "compared: its "
-                    "model run is repeated. Which other evaluations of the earlier run differ from it {}",
+                    "compared: its model run is repeated. Which other evaluations of the earlier run differ from it {}",
                     pairs_.path(), first, kKnown));
   } else if (earlier.lostRows > 0) {
     log.warning(fmt::format(

@@ -20,8 +20,7 @@ namespace {
 
 constexpr std::string_view kItemNameMeaning =
     "Its name in the file, in upper or lower case, with or without a unit in brackets behind it, in place of the "
-    "number "
-    "or beside it: they must then agree.";
+    "number or beside it: they must then agree.";
 
 /// The keywords of the series that `seriesOf(measure)` returns.
 template <class SeriesOf>

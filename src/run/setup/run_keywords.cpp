@@ -64,9 +64,8 @@ const SettingSection<RunConfig>& simulationOptionSection() {
              .meaning =
                  "1: a set for which the model would get the same values as in an earlier successful evaluation of the "
                  "run has that result, and the model is not run; such rows are marked in the column `Repeats`. "
-                 "Scenario "
-                 "runs, and runs with `SAVE_OUTPUT_FILES`, run the model for every set. 0: the model is always run, as "
-                 "one that draws random numbers needs it.",
+                 "Scenario runs, and runs with `SAVE_OUTPUT_FILES`, run the model for every set. 0: the model is "
+                 "always run, as one that draws random numbers needs it.",
              .bearsOnResults = kNotOfResults}),
         setting<&RunConfig::failedRunFolders>(
             {.name = "FailedRunFolders",

@@ -322,6 +322,7 @@ void SetupReader::readValidationPeriods(const SetupSection& parent) {
 /// location.
 void SetupReader::locateReference(const SetupSection& section, SeriesReference& reference) {
   reference.fileLocation = section.location("File_Name") + ": File_Name: ";
+  reference.isOfModel = section.name() == "SIMULATION_FILE";
   reference.itemName = trim(reference.itemName);
   const std::string_view itemKeyword = reference.itemName.empty() ? "Item_No" : "Item_Name";
   reference.itemLocation = fmt::format("{}: {}: ", section.location(itemKeyword), itemKeyword);
@@ -473,8 +474,9 @@ void SetupReader::readSimultaneousSimulations() {
   // A slot has its own copy of the model; unused slots would only fill the disk.
   const int mostUsed = config_.mostAtOnce();
   if (config_.simultaneousSimulations <= mostUsed) return;
-  section.warn(kSlotsKeyword, fmt::format("only {} can be used by the evaluations of this run", mostUsed));
   config_.simultaneousSimulations = mostUsed;
+  if (config_.task && !config_.task->earlierResultFile().empty()) return;  // it runs no model
+  section.warn(kSlotsKeyword, fmt::format("only {} can be used by the evaluations of this run", mostUsed));
 }
 
 void SetupReader::readMeasureFile() {

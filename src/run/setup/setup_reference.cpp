@@ -19,13 +19,14 @@ keyword rows; do not edit it.
 - A keyword without a default is required, and so is a section that is read, unless its heading says otherwise. A section
   that the run does not need may be left out.
 - Types: *integer* (32 bits), *real* (an integer is accepted), *text* and *file* (between quotes, at most {} bytes), *name*
-  (a text that is not blank), *free text* (of any length), *list* (reals with commas between them), *date*, *code*. See
+  (a text that is not blank), *free text* (of any length), *list* (reals with commas between them), *date*, *code*, *item*. See
   [file formats](file-formats.md) for how they are written. A file's name is relative to the setup file's folder, or
   absolute.
 - A *code* is one of a few values, given by its number or by its name between quotes, in upper or lower case:
   `Algorithm_Type = 2` and `Algorithm_Type = 'DDS'` are the same. The names follow the keywords of their section; what has
   no number there has a name only. Where a code means no or yes, the names are `'no'` and `'yes'`;
   of another number the lowest bit counts, with a warning, unless the keyword says otherwise.
+- An *item* is one of a list of the setup, given by its number, counting from 1, or by its name between quotes.
 - Unknown sections and keywords are not read; the run log warns of them and names the nearest known one.
 )";
 
@@ -61,7 +62,8 @@ std::string keywordTableOf(const SectionRow& section) {
 std::string validText(const KeywordRow& row) {
   const std::string text = row.facts.range.text();
   const auto hasNameOnly = [](const CodeName& code) { return !code.code.has_value(); };
-  return text.empty() || std::ranges::none_of(row.facts.codes, hasNameOnly) ? text : text + " or a name";
+  const bool mayBeName = row.type == KeywordType::item || std::ranges::any_of(row.facts.codes, hasNameOnly);
+  return text.empty() || !mayBeName ? text : text + " or a name";
 }
 
 std::string_view keywordTypeName(KeywordType type) {
@@ -70,6 +72,8 @@ std::string_view keywordTypeName(KeywordType type) {
       return "integer";
     case KeywordType::code:
       return "code";
+    case KeywordType::item:
+      return "item";
     case KeywordType::real:
       return "real";
     case KeywordType::name:

@@ -98,6 +98,14 @@ ParameterDistributions readDistributions(const TaskReading& reading, const Setup
   return ParameterDistributions(std::move(made), readCorrelations(section, space));
 }
 
+std::optional<std::string> firstDistribution(const SetupSection& section, std::size_t count) {
+  for (std::size_t j = 1; j <= count; ++j) {
+    std::string name = fmt::format("{}{}", kPrefix, j);
+    if (section.has(name)) return name;
+  }
+  return std::nullopt;
+}
+
 std::vector<const SectionRow*> distributionSections(std::string_view task) {
   static const SectionRow ofUncertainty = distributionRow(kOfUncertainty);
   static const SectionRow ofSensitivity = distributionRow(kOfSensitivity);

@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstddef>
+#include <optional>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -20,6 +22,9 @@ enum class MissingDistribution {
 /// Throws FatalError.
 ParameterDistributions readDistributions(const TaskReading& reading, const SetupSection& section,
                                          MissingDistribution missing = MissingDistribution::isUniform);
+
+/// The first section with a distribution of one of `count` parameters that `section` holds, "PARAMETER_2"; empty: none.
+std::optional<std::string> firstDistribution(const SetupSection& section, std::size_t count);
 
 /// The same sections for the schema of setups, of the task with the section `task`: "UNCERTAINTY_ESTIMATION".
 std::vector<const SectionRow*> distributionSections(std::string_view task);

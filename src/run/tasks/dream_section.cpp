@@ -1,12 +1,16 @@
 #include "run/tasks/dream_section.h"
 
 #include <algorithm>
+#include <cmath>
+#include <iterator>
 #include <string>
 #include <utility>
 #include <vector>
 
 #include <fmt/format.h>
 
+#include "common/named_items.h"
+#include "common/short_list.h"
 #include "common/text.h"
 #include "measures/period_series.h"
 
@@ -30,9 +34,8 @@ constexpr std::string_view kErrorModelRefusal = "Error: Error model of DREAM inv
 
 constexpr char kDeviationMeaning[] =
     "Standard deviation of the errors; in the unit of the transformed series with `Box_Cox_Lambda`; with "
-    "`Error_Share` its part that is the same for all values; with `Likelihood = 'Student'` the scale. By default "
-    "between 0.001 and 10 times the standard deviation of the observations. The prior is uniform for its logarithm, "
-    "with a lower bound of 0 for the deviation itself.";
+    "`Error_Share` its part that is the same for all values; with `Likelihood = 'Student'` the scale. A fixed one is "
+    "above 0. The prior is uniform for its logarithm, with a lower bound of 0 for the deviation itself.";
 
 constexpr const char* kTermMeanings[] = {
     kDeviationMeaning,
@@ -41,13 +44,43 @@ constexpr const char* kTermMeanings[] = {
     "Lambda of the Box-Cox transformation of simulated and observed values; 1: none, 0: logarithm.",
     "Degrees of freedom of Student's t distribution. The prior is uniform for the logarithm.",
     "Skewness xi of the generalised likelihood; 1: symmetric. The prior is uniform for the logarithm.",
-    "Kurtosis beta of the generalised likelihood; -1: uniform, 0: normal, 1: double exponential.",
+    "Kurtosis beta of the generalised likelihood; towards -1 nearly uniform, 0: normal, 1: double exponential.",
     "Bias mu_h of the generalised likelihood: a simulated value f counts as f exp(mu_h f).",
 };
+
+/// What a term is where the setup says nothing of it.
+std::string defaultMeaning(ErrorTerm term) {
+  const ErrorTermRow& row = errorTermRows()[term];
+  std::vector<std::string> estimating;
+  bool isElsewhere = false;
+  for (std::size_t k = 0; k < std::size(kLikelihoodNames); ++k) {
+    const auto form = static_cast<LikelihoodForm>(k);
+    if (hasTerm(form, term)) {
+      estimating.push_back(fmt::format("'{}'", kLikelihoodNames[k].name));
+    } else {
+      isElsewhere = isElsewhere || readsTerm(form, term);
+    }
+  }
+  if (estimating.empty()) return fmt::format(" Default {:g}.", row.neutral);
+  const std::string bounds = term == kDeviation
+                                 ? fmt::format("{:g} and {:g} times the standard deviation of the observations",
+                                               kLeastDeviation, kMostDeviation)
+                                 : fmt::format("{:g} and {:g}", row.lower, row.upper);
+  return fmt::format(
+      " By default it is estimated between {}{}.", bounds,
+      isElsewhere ? fmt::format(" with {}, and is {:g} otherwise", fmt::join(estimating, " and "), row.neutral) : "");
+}
 
 template <class Settings, std::size_t Term>
 KeywordRow termRow(ErrorModelSettings& (*modelOf)(Settings&)) {
   static_cast<void>(modelOf);
+  const ErrorTermRow& row = errorTermRows()[Term];
+  std::string meaning = kTermMeanings[Term];
+  if (std::is_same_v<Settings, DreamSection>) {
+    meaning +=
+        " One number: it is fixed; two: it is estimated between them." + defaultMeaning(static_cast<ErrorTerm>(Term));
+  }
+  const bool isLimited = std::isfinite(row.least) || std::isfinite(row.most);
   return setting<Settings>(
       [](Settings& settings) -> std::vector<double>& {
         if constexpr (std::is_same_v<Settings, DreamSection>) {
@@ -56,12 +89,11 @@ KeywordRow termRow(ErrorModelSettings& (*modelOf)(Settings&)) {
           return settings.terms[Term];
         }
       },
-      {.name = errorTermRows()[Term].keyword,
+      {.name = row.keyword,
        .defaultValue = kNoDefault,
-       .meaning = std::string(kTermMeanings[Term]) +
-                  (std::is_same_v<Settings, DreamSection> ? " One number: it is fixed; two: it is estimated between "
-                                                            "them."
-                                                          : "")});
+       .range = {row.least, row.most},
+       .refusal = isLimited ? kErrorModelRefusal : std::string_view(),
+       .meaning = std::move(meaning)});
 }
 
 template <class Settings, std::size_t... Terms>
@@ -79,12 +111,17 @@ std::vector<KeywordRow> dreamRows() {
            .codes = kLikelihoodNames,
            .meaning = "How the errors of the simulated series are distributed. 'objective': the log-likelihood is "
                       "minus an objective function, for models that give their own."}),
-      setting<&DreamSection::objective>({.name = kObjectiveKeyword,
-                                         .defaultValue = "0",
-                                         .range = from(0),
-                                         .refusal = kDreamRefusal,
-                                         .meaning = "With `Likelihood = 'objective'`, the number of the objective "
-                                                    "function; 0: the aggregate of all."}),
+      choice<DreamSection>(
+          [](DreamSection& s, const SetupValue& value) {
+            if (const auto* number = std::get_if<std::int32_t>(&value)) s.objective = *number;
+            if (const auto* name = std::get_if<std::string>(&value)) s.objectiveName = *name;
+          },
+          {.name = kObjectiveKeyword,
+           .type = KeywordType::item,
+           .defaultValue = "0",
+           .range = from(0),
+           .refusal = kDreamRefusal,
+           .meaning = "With `Likelihood = 'objective'`, the objective function; 0: the aggregate of all."}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.chainCount; },
                             {.name = "Chain_Count",
                              .defaultValue = "4",
@@ -189,8 +226,8 @@ void checkTerms(const SetupSection& section, const ErrorModelSettings& settings)
     if (numbers.size() > 2) {
       refuse(fmt::format("expected one number (a fixed value) or two (bounds), found {}", numbers.size()));
     }
-    const bool isFixedDeviation = k == kDeviation && numbers.size() == 1;
-    const ValueRange range{row.least, row.most, isFixedDeviation};
+    const bool isFixedAtZero = k == kDeviation && numbers == std::vector<double>{0.0};
+    const ValueRange range{row.least, row.most, isFixedAtZero};
     for (const double number : numbers) {
       if (!range.contains(number)) refuse(fmt::format("expected {}, found {:g}", range.text(), number));
     }
@@ -233,6 +270,22 @@ void refuseUnread(const SetupSection& section, const ErrorModelSettings& written
   }
 }
 
+/// The number of the objective function that the setup names.
+std::int32_t numberOfObjective(const SetupSection& dream, const std::string& name,
+                               std::span<const ObjectiveFunction> objectives) {
+  std::vector<std::string> names;
+  for (const ObjectiveFunction& objective : objectives) names.push_back(objective.name);
+  const std::vector<std::size_t> meant = itemsNamed(name, names);
+  if (meant.size() > 1) dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword, ambiguityText(name, names, meant));
+  if (meant.size() == 1) return static_cast<std::int32_t>(meant.front()) + 1;
+  constexpr std::size_t kMostNamed = 20;
+  ShortList known(kMostNamed);
+  for (const std::string& each : names) known.add(quotedForMessage(trim(each)));
+  dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword,
+               fmt::format("expected 0 to {} or the name of an objective function, {}; found {}", names.size(),
+                           known.text(), quotedForMessage(name)));
+}
+
 /// What depends on other settings of the section, or on what the likelihood is of.
 void checkDream(const SetupSection& dream, const DreamSection& settings, std::size_t objectiveCount,
                 bool comparesSeries) {
@@ -266,9 +319,8 @@ void checkDream(const SetupSection& dream, const DreamSection& settings, std::si
 const SettingSection<DreamSection>& dreamSection() {
   static const SettingSection<DreamSection> section{
       {"UNCERTAINTY_ESTIMATION/DREAM", "when `Uncertainty_Type` is 'DREAM'",
-       "The posterior distribution by Markov chains, DREAM(ZS). "
-       "`Sample_Size` is the most model runs that it makes, and at least ten for "
-       "each chain.",
+       "The posterior distribution by Markov chains, DREAM(ZS). `Sample_Size` is the most model runs that it makes, "
+       "and at least ten for each chain.",
        dreamRows()}};
   return section;
 }
@@ -304,6 +356,9 @@ void readDreamSection(const SetupSection& section, std::span<const OutputMeasure
   settings.place = dream.location(kLikelihoodKeyword);
   checkTerms(dream, settings.errors);
   const std::vector<std::size_t> compared = measuresOfLikelihood(measures, objectives);
+  if (!settings.objectiveName.empty()) {
+    settings.objective = numberOfObjective(dream, settings.objectiveName, objectives);
+  }
   checkDream(dream, settings, objectives.size(), !compared.empty());
   const LikelihoodForm form = *settings.errors.form;
   ErrorModels models{{form, &settings.errors}};
@@ -313,9 +368,17 @@ void readDreamSection(const SetupSection& section, std::span<const OutputMeasure
     ErrorModelSettings& model = settings.own[n];
     own.read(errorModelSection(), model);
     checkTerms(own, model);
-    if (model.form == LikelihoodForm::objective || form == LikelihoodForm::objective) {
+    if (form == LikelihoodForm::objective) {
       own.refuse(kErrorModelRefusal, kLikelihoodKeyword,
-                 "expected no error model of an output measure where the likelihood is an objective function");
+                 fmt::format("the likelihood of DREAM is an objective function, which has no errors of series to "
+                             "describe: remove the section {}",
+                             own.name()));
+    }
+    if (model.form == LikelihoodForm::objective) {
+      own.refuse(kErrorModelRefusal, kLikelihoodKeyword,
+                 fmt::format("expected how the errors of the series are distributed, found '{}': an objective function "
+                             "can only be the whole likelihood, that of DREAM",
+                             nameOf(*model.form)));
     }
     if (std::ranges::find(compared, n - 1) == compared.end()) {
       dream.refuse(kDreamLikelihoodRefusal, fmt::format("{}{}", kErrorModelPrefix, n), std::string(kErrorModelMeasure));

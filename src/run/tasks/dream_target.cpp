@@ -87,7 +87,7 @@ void DreamTarget::addTerms(const DreamSection& settings, const ErrorModelSetting
     if (term == kDeviation && numbers.back() == 0.0) {
       const double one = series.errors.deviation(lambda.front());
       const double other = series.errors.deviation(lambda.back());
-      numbers = {1e-3 * std::min(one, other), 10.0 * std::max(one, other)};
+      numbers = {kLeastDeviation * std::min(one, other), kMostDeviation * std::max(one, other)};
       if (!(numbers.front() > 0.0)) {
         fatalError(kDreamLikelihoodRefusal,
                    fmt::format("{}: the observations of {} do not vary: expected {} with a value or with bounds",

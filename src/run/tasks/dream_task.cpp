@@ -1,6 +1,8 @@
 #include "run/tasks/dream_task.h"
 
 #include <algorithm>
+#include <cmath>
+#include <limits>
 
 #include <fmt/format.h>
 
@@ -19,10 +21,35 @@ namespace mirevo {
 namespace {
 
 constexpr std::size_t kPriorDraws = 40'000;
+constexpr std::size_t kMostListed = 50;  // priors in the log
 constexpr std::size_t kLeastPriorDraws = 1'000;
 constexpr std::size_t kMostPriorValues = 4'000'000;  // 32 MB
 constexpr const char* kPriorRefusal = "Error: Prior of DREAM invalid";
 constexpr CodeName kFormName{std::nullopt, "DREAM"};
+
+/// Of a prior with so high a peak at an end that numbers, which are no finer there, cannot tell its values apart.
+std::vector<std::string> boundWarnings(const Distribution& prior, const SearchSpace& space, std::size_t j) {
+  constexpr double kTooMuch = 1e-3;
+  constexpr double kLeast = std::numeric_limits<double>::min();
+  const double lower = std::max(space.lower[j], prior.quantile(kLeast));
+  const double upper = std::min(space.upper[j], prior.quantile(1.0 - std::numeric_limits<double>::epsilon() / 2.0));
+  const double all = prior.cumulative(space.upper[j]) - prior.cumulative(space.lower[j]);
+  std::vector<std::string> texts;
+  const auto add = [&](double probability, std::string_view end, double value) {
+    if (!(probability > kTooMuch * all)) return;
+    texts.push_back(
+        fmt::format("{:.2g} % of the prior's probability of {} lies within the rounding of numbers at its {} end, {:g} "
+                    "(search scale): a chain that comes there stays. Expected a prior with a density that is finite "
+                    "there, such as that of a beta distribution with an {} of 1 or more, or bounds that leave the end "
+                    "out",
+                    100.0 * probability / all, space.names[j], end, value, end == "lower" ? "Alpha" : "Beta"));
+  };
+  const double above = std::nextafter(lower, std::numeric_limits<double>::infinity());
+  const double below = std::nextafter(upper, -std::numeric_limits<double>::infinity());
+  add(prior.cumulative(above) - prior.cumulative(space.lower[j]), "lower", lower);
+  add(prior.upperTail(below) - prior.upperTail(space.upper[j]), "upper", upper);
+  return texts;
+}
 
 }  // namespace
 
@@ -47,6 +74,11 @@ void DreamTask::read(const TaskReading& reading) {
   UncertaintySection filled{settings, randomSeed};
   section.read(uncertaintySection(), filled);
   section.require(validateBandEnd(settings, reading.period));
+  if (settings.redrawsInfeasible) {
+    section.warn(kRedrawKeyword,
+                 "has no effect with Uncertainty_Type = 'DREAM': chains begin in sets that can be run, and reject "
+                 "proposals that cannot, without a model run");
+  }
   prior_ = readDistributions(reading, section);
   if (const auto discrete = prior_.firstWithoutDensity()) {
     section.refuse(kPriorRefusal, kUncertaintyTypeKeyword,
@@ -113,7 +145,7 @@ std::string DreamTask::description() const {
 
 std::vector<std::string> DreamTask::summaryLines(const SearchSpace& space) const {
   const DreamSettings& own = dream.sampler;
-  std::vector<std::string> lines = distributionLines(prior_, space, kUncertaintySection);
+  std::vector<std::string> lines = distributionLines(prior_, space, kUncertaintySection, kMostListed);
   lines.insert(lines.end(),
                {fmt::format("Likelihood: {}", kLikelihoodNames[static_cast<std::size_t>(*dream.errors.form)].name),
                 fmt::format("{} chains, at most {} model runs; the first {:g} of them are burn-in", own.chainCount,
@@ -124,7 +156,11 @@ std::vector<std::string> DreamTask::summaryLines(const SearchSpace& space) const
 }
 
 std::vector<std::string> DreamTask::warnings(const SearchSpace& space) const {
-  return distributionWarnings(prior_, space);
+  std::vector<std::string> texts = distributionWarnings(prior_, space);
+  for (std::size_t j = 0; j < prior_.size(); ++j) {
+    for (std::string& text : boundWarnings(prior_[j], space, j)) texts.push_back(std::move(text));
+  }
+  return texts;
 }
 
 /// The chains begin as they did, whatever Sample_Size, R_Hat_Limit and Effective_Size are now: burn-in keeps its
@@ -149,27 +185,36 @@ void DreamTask::continueFrom(const std::vector<EarlierSearch>& searches) {
   dream.sampler.leastRuns = searches.back().lastEvaluation;
 }
 
-void DreamTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
-  constexpr int kMostDraws = 100'000;
-  ChainRandom random(1);
-  std::vector<double> unit(prior_.size());
-  std::string reason = "they lie outside the bounds";
-  for (int k = 0; k < kMostDraws; ++k) {
-    for (double& value : unit) value = random.uniform();
-    const ParameterSet set = prior_.setAt(unit);
-    bool isInside = true;
-    for (std::size_t j = 0; j < set.size(); ++j) {
-      isInside = isInside && set[j] >= space.lower[j] && set[j] <= space.upper[j];
-    }
-    if (!isInside) continue;
+/// One that can be run; otherwise empty, with the reason.
+std::optional<ParameterSet> DreamTask::priorSet(const SearchSpace& space, const Feasibility& feasibility,
+                                                std::string& reason) const {
+  reason = "they lie outside the bounds";
+  DreamProblem problem;
+  problem.lower = space.lower;
+  problem.upper = space.upper;
+  problem.drawPrior = [this](std::span<const double> unit) { return prior_.setAt(unit); };
+  problem.logPrior = [&](std::span<const double> set) {
     const auto violation = feasibility.violation(set);
-    if (!violation) return;
+    if (!violation) return prior_.logDensity(set);
     reason = *violation;
-  }
-  fatalError(
-      feasibility.isTested() ? feasibility.noSetMessage()
-                             : "Error: No parameter set found in the prior that can be run",
-      fmt::format("{}: none of {} sets drawn from the prior of DREAM can be run: {}", dream.place, kMostDraws, reason));
+    return -std::numeric_limits<double>::infinity();
+  };
+  ChainRandom random(1);
+  return drawAllowed(problem, random);
+}
+
+void DreamTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
+  std::string reason;
+  if (priorSet(space, feasibility, reason)) return;
+  fatalError(feasibility.isTested() ? feasibility.noSetMessage()
+                                    : "Error: No parameter set found in the prior that can be run",
+             fmt::format("{}: none of {} sets drawn from the prior of DREAM can be run: {}", dream.place,
+                         kMostPriorDraws, reason));
+}
+
+std::optional<ParameterSet> DreamTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {
+  std::string reason;
+  return priorSet(space, feasibility, reason);
 }
 
 TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
@@ -181,8 +226,9 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   const auto summary =
       summarisePosterior(*sampler_, dimensions, prior, static_cast<std::size_t>(std::max(settings.matrixLimit, 0)));
   const std::string correlationFile = fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation));
-  outcome.report = formatPosterior(dream.sampler, *sampler_, dimensions, summary ? &*summary : nullptr,
-                                   target_->failures(), correlationFile);
+  outcome.report =
+      formatPosterior(dream.sampler, *sampler_, dimensions, summary ? &*summary : nullptr, target_->failures(),
+                      {fileNameOf(runFilePath(context.filePrefix, run_files::kPosterior)), correlationFile});
   if (target_->hasCounted()) {
     const auto counts = target_->countLines();
     auto place = outcome.report.begin() + 1;

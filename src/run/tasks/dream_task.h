@@ -30,6 +30,7 @@ class DreamTask final : public Task {
   std::optional<KeptSteps> keptSteps() const override;
   bool usesExactMeasures() const override { return true; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   /// Of the generations that are complete.
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
@@ -45,6 +46,8 @@ class DreamTask final : public Task {
  private:
   void refuseImpossiblePriors(const TaskReading& reading, const SetupSection& section) const;
   void checkSize(const TaskReading& reading, const SetupSection& section) const;
+  std::optional<ParameterSet> priorSet(const SearchSpace& space, const Feasibility& feasibility,
+                                       std::string& reason) const;
   void advance();
   TaskOutcome outcomeOf(const TaskContext& context) const;
 

@@ -117,12 +117,7 @@ void GlueTask::warnOfUnused(const SetupSection& section, const SetupSection& own
   constexpr const char* kReason = "has no effect with Earlier_Result_File, as no set is drawn";
   if (section.isWritten(kRedrawKeyword)) section.warn(kRedrawKeyword, kReason);
   if (own.isWritten(kSamplingKeyword)) own.warn(kSamplingKeyword, kReason);
-  for (std::size_t j = 1; j <= settings.distributions.size(); ++j) {
-    const std::string name = fmt::format("PARAMETER_{}", j);
-    if (!section.has(name)) continue;
-    section.warn(name, kReason);
-    break;
-  }
+  if (const auto name = firstDistribution(section, settings.distributions.size())) section.warn(*name, kReason);
 }
 
 /// Values that distributions have exactly, such as those of a file.
@@ -200,6 +195,11 @@ std::vector<std::string> GlueTask::setDoubts(const SearchSpace& /*space*/, const
   if (isOfEarlierRun() || settings.redrawsInfeasible || !feasibility.isTested()) return {};
   return infeasibleSets(feasibility, drawSample(feasibility).sets, kWhatSets, settings.sampleSize, kInfeasibleRemedy)
       .texts();
+}
+
+std::optional<ParameterSet> GlueTask::trialSet(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
+  if (isOfEarlierRun()) return std::nullopt;
+  return firstFeasible(feasibility, drawSample(feasibility).sets);
 }
 
 EarlierSample GlueTask::evaluateSample(const TaskContext& context) const {

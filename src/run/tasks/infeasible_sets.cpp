@@ -1,9 +1,11 @@
 #include "run/tasks/infeasible_sets.h"
 
+#include <algorithm>
 #include <utility>
 
 #include <fmt/format.h>
 
+#include "common/short_list.h"
 #include "evaluation/failed_run_policy.h"
 
 namespace mirevo {
@@ -16,22 +18,20 @@ constexpr std::size_t kMostNumbers = 20;  // in the warning
 InfeasibleSets infeasibleSets(const Feasibility& feasibility, std::span<const ParameterSet> sets, std::string_view what,
                               int planned, std::string_view remedy) {
   if (!feasibility.isTested()) return {};
-  std::string numbers;
+  ShortList numbers(kMostNumbers);
   std::string first;
-  std::size_t count = 0;
   for (std::size_t i = 0; i < sets.size(); ++i) {
     const std::optional<std::string> violation = feasibility.violation(sets[i]);
     if (!violation) continue;
-    if (count == 0) first = fmt::format("No. {}: {}", i + 1, *violation);
-    if (count < kMostNumbers) numbers += fmt::format("{}{}", count == 0 ? "" : ", ", i + 1);
-    ++count;
+    if (numbers.isEmpty()) first = fmt::format("No. {}: {}", i + 1, *violation);
+    numbers.add(std::to_string(i + 1));
   }
+  const std::size_t count = numbers.count();
   if (count == 0) return {};
-  if (count > kMostNumbers) numbers += fmt::format(" and {} more", count - kMostNumbers);
   std::string text =
       fmt::format("{} of {} {} {} not run and {}, as {} a constraint or an equation has no finite value: No. {}\n   {}",
                   count, sets.size(), what, count == 1 ? "is" : "are", count == 1 ? "fails" : "fail",
-                  count == 1 ? "it violates" : "they violate", numbers, first);
+                  count == 1 ? "it violates" : "they violate", numbers.text(), first);
   const int limit = FailedRunPolicy(planned).limit();
   const bool endsRun = count > static_cast<std::size_t>(limit);
   if (endsRun) {
@@ -55,6 +55,12 @@ void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterS
   } else {
     context.log.warning(found.text);
   }
+}
+
+std::optional<ParameterSet> firstFeasible(const Feasibility& feasibility, std::span<const ParameterSet> sets) {
+  const auto found = std::ranges::find_if(sets, [&](const ParameterSet& set) { return feasibility.holds(set); });
+  if (found == sets.end()) return std::nullopt;
+  return *found;
 }
 
 }  // namespace mirevo

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -28,5 +29,8 @@ InfeasibleSets infeasibleSets(const Feasibility& feasibility, std::span<const Pa
 /// where some of the sets can be run, or empty.
 void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterSet> sets, std::string_view what,
                           int planned, std::string_view remedy = {});
+
+/// The first of the sets that can be run; empty: none.
+std::optional<ParameterSet> firstFeasible(const Feasibility& feasibility, std::span<const ParameterSet> sets);
 
 }  // namespace mirevo

@@ -43,10 +43,7 @@ void MorrisTask::read(const TaskReading& reading) {
   }
   if (own) tellOfDesign(*own);
   distributions = readDistributions(reading, section);
-  givesDistributions = false;
-  for (std::size_t j = 1; j <= reading.variableCount; ++j) {
-    givesDistributions = givesDistributions || section.holds(fmt::format("PARAMETER_{}", j));
-  }
+  givesDistributions = firstDistribution(section, reading.variableCount).has_value();
   ParameterModel model({reading.parameters.begin(), reading.parameters.end()},
                        {reading.constraints.begin(), reading.constraints.end()});
   plan_.reset();
@@ -101,6 +98,15 @@ void MorrisTask::requireSets(const SearchSpace& space, const Feasibility& feasib
   }
   fatalError(feasibility.noSetMessage(),
              fmt::format("No elementary effect has two sets that can be run: {}", plan.violation));
+}
+
+std::optional<ParameterSet> MorrisTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {
+  const EffectPlan& plan = planIn(space, feasibility);
+  for (const EffectTrajectory& trajectory : plan.trajectories) {
+    const std::vector<ParameterSet> sets = setsOf(plan, trajectory, distributionsIn(space));
+    if (!sets.empty()) return sets.front();
+  }
+  return std::nullopt;
 }
 
 TaskOutcome MorrisTask::outcomeOf(const TaskContext& context, const EffectPlan& plan,

@@ -77,9 +77,8 @@ class BandReport {
     if (count == 0) return;
     const std::string text = fmt::format(
         "at {} model runs have values that the Box-Cox transformation gives no errors, zeros with a lambda of at most "
-        "0 "
-        "or negative ones: the band has the zeros as they are, and lacks the others. A larger Box_Cox_Shift gives them "
-        "errors",
+        "0 or negative ones: the band has the zeros as they are, and lacks the others. A larger Box_Cox_Shift gives "
+        "them errors",
         countText(count, "time"));
     lines.push_back(fmt::format("   {}", text));
     context_.log.warning(fmt::format("Band of total uncertainty of {}: {}", name, text));

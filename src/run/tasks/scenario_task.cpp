@@ -182,6 +182,10 @@ std::vector<std::string> ScenarioTask::setDoubts(const SearchSpace& space, const
   return infeasibleSets(feasibility, all, kWhatSets, static_cast<int>(all.size())).texts();
 }
 
+std::optional<ParameterSet> ScenarioTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {
+  return firstFeasible(feasibility, sets(space, parameters_));
+}
+
 TaskOutcome ScenarioTask::run(const TaskContext& context) {
   const std::vector<ParameterSet> all = sets(context.space, context.parameters);
   warnOfInfeasibleSets(context, all, kWhatSets, static_cast<int>(all.size()));

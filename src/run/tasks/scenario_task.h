@@ -36,6 +36,7 @@ class ScenarioTask final : public Task {
   TaskReport report() const override;
   int plannedEvaluations() const override;
   std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
 
   ScenarioSettings settings;

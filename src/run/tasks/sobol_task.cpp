@@ -210,6 +210,11 @@ std::vector<std::string> SobolTask::setDoubts(const SearchSpace& /*space*/, cons
   return infeasibleSets(feasibility, sets, kWhatSets, static_cast<int>(sets.size()), kInfeasibleRemedy).texts();
 }
 
+std::optional<ParameterSet> SobolTask::trialSet(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
+  UniformGenerator random = draw().random;
+  return firstFeasible(feasibility, sobolSets(design_, factors_, distributions_, random));
+}
+
 TaskOutcome SobolTask::outcomeOf(const TaskContext& context, std::span<const EvaluationResult> results,
                                  std::vector<std::string>& warnings) const {
   TaskOutcome outcome{std::string(kEndOfTask)};

@@ -12,6 +12,7 @@
 #include "algorithms/analyses/evaluated_sample.h"
 #include "algorithms/searches/search_method.h"
 #include "common/data_table.h"
+#include "common/parameter_set.h"
 #include "common/progress_messages.h"
 #include "common/run_files.h"
 #include "common/settings/keyword_row.h"
@@ -199,6 +200,11 @@ class Task {
   /// What run() will warn of before its first model run: sets that will be evaluated although they cannot be run.
   virtual std::vector<std::string> setDoubts(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {
     return {};
+  }
+  /// For a check of the setup whose initial values cannot be run: a set that can, of those that run() may evaluate.
+  /// Empty where there is none, and for a task that evaluates the initial values.
+  virtual std::optional<ParameterSet> trialSet(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {
+    return std::nullopt;
   }
   /// Whether sets are judged by their aggregate alone.
   virtual bool judgesByAggregate() const { return true; }

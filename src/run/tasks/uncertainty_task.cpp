@@ -99,6 +99,14 @@ std::vector<std::string> UncertaintyTask::setDoubts(const SearchSpace& /*space*/
       .texts();
 }
 
+std::optional<ParameterSet> UncertaintyTask::trialSet(const SearchSpace& /*space*/,
+                                                      const Feasibility& feasibility) const {
+  if (settings.distributions.size() == 0) return std::nullopt;
+  return firstFeasible(feasibility, settings.redrawsInfeasible
+                                        ? feasibleUncertaintySample(settings, randomSeed, feasibility).sets
+                                        : uncertaintySample(settings, randomSeed, {}));
+}
+
 /// `acceptance`: a line on the sets drawn, if any can be drawn again.
 std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context, std::string& acceptance) const {
   if (settings.distributions.size() == 0) return {};

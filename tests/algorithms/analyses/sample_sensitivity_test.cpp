@@ -111,6 +111,20 @@ TEST(SampleSensitivity, OfAParameterThatIsNotVariedIsUnknown) {
   EXPECT_THAT(text, Not(HasSubstr("Less than")));
 }
 
+TEST(SampleSensitivity, SaysWhyAnOutputHasNoIndices) {
+  const SearchSpace space = spaceBetween(1, 1, 2);
+  const AnalysisNames names{{"a"}, {}, {"fit"}};
+  const std::pair<OutputFunction, const char*> cases[] = {
+      {[](std::span<const double> x) { return 1e200 * x[0]; }, "No first-order indices: the variance of its values is"},
+      {[](std::span<const double> x) { return 1e-200 * x[0]; }, "they are as large as 1e150, or as small as 1e-150"},
+      {[](std::span<const double>) { return 3.0; }, "No indices: all runs have the same value"}};
+  for (const auto& [function, reason] : cases) {
+    const SampleSensitivity found = sampleSensitivity(sampleOf(space, 200, function, 3), space, names, 1);
+    EXPECT_TRUE(std::isnan(found.outputs[0].parameters[0].firstOrder));
+    EXPECT_THAT(formatSampleSensitivity(found, names, "x.dat", false), Contains(HasSubstr(reason)));
+  }
+}
+
 TEST(SampleSensitivity, RankCorrelationIsThatOfRanksWithTies) {
   const SearchSpace space = spaceBetween(1, 0, 10);
   UncertaintyOutcome outcome;

@@ -22,7 +22,8 @@ struct ShownChains {
     chains.emplace(sampled(settings, std::move(problem)));
   }
   std::vector<std::string> report(const PosteriorSummary* summary, int failures = 0) const {
-    return formatPosterior(settings, *chains, dimensions, summary, failures, "basin_SampleCorrelation.dat");
+    return formatPosterior(settings, *chains, dimensions, summary, failures,
+                           {"basin_Posterior.dat", "basin_SampleCorrelation.dat"});
   }
 
   DreamSettings settings;
@@ -118,6 +119,27 @@ TEST(Posterior, OfManyDimensionsHasTheLargestCorrelationsAndSaysNothingOfParamet
   EXPECT_THAT(shown.report(&*summary), tradeOff);
   summary->dimensions[0].rHat = 1.4;
   EXPECT_THAT(shown.report(&*summary), ::testing::Not(tradeOff));
+
+  // The table of the log has those that the data have narrowed, which stand behind ten of which they say nothing.
+  const PosteriorSummary::Dimension narrowed = summary->dimensions[1];
+  PosteriorSummary::Dimension asBefore = narrowed;
+  asBefore.quantiles = asBefore.priorQuantiles;
+  summary->dimensions.assign(60, narrowed);
+  std::fill_n(summary->dimensions.begin(), 10, asBefore);
+  summary->mostProbable.assign(60, 0.0);
+  shown.dimensions.names.clear();
+  for (int j = 0; j < 60; ++j) shown.dimensions.names.push_back(fmt::format("p{}.", j));
+  const std::vector<std::string> lines = shown.report(&*summary);
+  const auto rows = [&](const std::string& name) {
+    return std::ranges::count_if(
+        lines, [&](const std::string& line) { return line.starts_with("   " + name) && line.size() > 100; });
+  };
+  EXPECT_EQ(rows("p"), 50);
+  EXPECT_EQ(rows("p9."), 0);
+  EXPECT_EQ(rows("p10."), 1);
+  EXPECT_EQ(rows("p59."), 1);
+  EXPECT_THAT(lines, ::testing::Contains(::testing::HasSubstr("The other 10 of 60 parameters, which the data have "
+                                                              "narrowed less, are in basin_Posterior.dat")));
 }
 
 }  // namespace

@@ -77,7 +77,9 @@ TEST_F(PosixProcessLauncherTest, EndsAreToldApart) {
   const std::tuple<const char*, unsigned, Kind, int, const char*> cases[] = {
       {"#!/bin/sh\nexit 0\n", 0755, Kind::none, 0, ""},
       {"echo no first line with an interpreter\n", 0755, Kind::none, 0, ""},
-      {"nonesuch\n", 0755, Kind::exitCode, 127, "exited with code 127 (a shell: command not found)"},
+      {"nonesuch\n", 0755, Kind::exitCode, 127,
+       "exited with code 127 (a shell: command not found; "
+       "the batch runs in the copy of its folder: name a program relative to that, or with its whole path)"},
       {"nonesuch\r\n", 0755, Kind::exitCode, 127,
        "exited with code 127 (a shell: command not found; the lines of the file end in CR LF, of which a shell takes "
        "CR "

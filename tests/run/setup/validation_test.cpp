@@ -37,7 +37,8 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "No model simulation sequence defined", "setup.kdx:6:30: TqSEKdxListItemCount: expected 1 or more, found 0"},
       {"'model\\run.sh' => ' '", "No model simulation sequence defined", "setup.kdx:8:25: BatchFileName"},
       {"'model\\run.sh' => 'model\\walk.sh'", "The file model\\walk.sh does not exist",
-       "setup.kdx:8:25: BatchFileName: model/walk.sh: No such file or directory"},
+       "setup.kdx:8:25: BatchFileName: model/walk.sh: No such file or directory; expected the name of a file that is "
+       "there"},
       {"'model\\run.sh' => 'model'", "The file model does not exist", "Is a directory"},
       {"'model\\run.sh' => 'Setup.SH'",
        "Model simulation file and mirevo file are located in the same directory with an identical name",
