@@ -1,13 +1,9 @@
 // Every figure as a file, taken as a reader takes it.
 import assert from 'node:assert/strict';
 import { readFileSync } from 'node:fs';
-import { after, before, test } from 'node:test';
-import { openBrowser } from './browser.mjs';
+import { test } from 'node:test';
+import { openReport } from './open_report.mjs';
 import * as sample from './sample_data.mjs';
-
-let browser;
-before(async () => { browser = await openBrowser(); });
-after(() => browser.close());
 
 /** The file that the browser saves when Enter is pressed on a button. */
 async function saved(page, button) {
@@ -28,7 +24,7 @@ const cellsOf = (text) => text.trimEnd().split('\r\n').map((line) => line.match(
 for (const name of ['optimisation', 'uncertainty', 'dream', 'sensitivity', 'screening', 'sobol']) {
   test(`${name}: every figure is taken as a drawing and as a table, whatever the names`, async () => {
     const data = name === 'optimisation' ? sample.withTables(4) : sample.dataOf(name);
-    const { page, complaints } = await browser.openReport(sample.hostile(data), { colorScheme: 'dark' });
+    const { page, complaints } = await openReport(sample.hostile(data), { colorScheme: 'dark' });
     const names = new Set();
     await keepFiles(page);
     for (const figure of await page.$$('figure')) {
@@ -55,7 +51,7 @@ test('a table is saved by keyboard, with every value in full, times as ISO, and 
   Object.assign(data.series[0], { unit: 'm\u00b3/s', thinned: true });
   data.series[0].observed[1] = 1234567.125;
   data.series[0].best[2] = -0.00001234;
-  const { page } = await browser.openReport(data);
+  const { page } = await openReport(data);
   const { name, text } = await saved(page, await page.$('#series figure .take >> nth=1'));
   assert.match(name, /^basin_series_.*_thinned\.csv$/);
   const rows = cellsOf(text);

@@ -1,12 +1,8 @@
 // Whether texts fit, on a wide and on a narrow screen: in the page, and in its charts as they are drawn at that width.
 import assert from 'node:assert/strict';
-import { after, before, test } from 'node:test';
-import { openBrowser } from './browser.mjs';
+import { test } from 'node:test';
+import { openReport } from './open_report.mjs';
 import * as sample from './sample_data.mjs';
-
-let browser;
-before(async () => { browser = await openBrowser(); });
-after(() => browser.close());
 
 /** Runs in the page: texts that overlap, are cut off or reach out of the window or their chart. */
 function misfits() {
@@ -59,7 +55,7 @@ for (const [name, data] of Object.entries(cases)) {
   test(`${name}: texts fit at 1400 and at 390 pixels`, async () => {
     const found = [];
     for (const width of [1400, 390]) {
-      const { page, complaints } = await browser.openReport(data, { width, height: 844 });
+      const { page, complaints } = await openReport(data, { width, height: 844 });
       found.push(...(await page.evaluate(misfits)).map((misfit) => `${width}: ${misfit}`), ...complaints);
       assert.equal(await page.evaluate(() => document.documentElement.scrollWidth), width);
       await page.context().close();
@@ -73,7 +69,7 @@ test('a short time axis says which year it is', async () => {
   for (const [start, hours, values] of [['1981-10-05T06:00:00', 1, 14], ['1981-10-03T00:00:00', 24, 20], ['1981-03-12T00:00:00', 24, 200]]) {
     for (const name of ['observed', 'initial', 'best']) data.series[0][name] = Array.from({ length: values }, (_, index) => 5 + index % 7);
     Object.assign(data.series[0], { start, step: hours * 3600000, count: values, period: null });
-    const { page } = await browser.openReport(data, { width: 390 });
+    const { page } = await openReport(data, { width: 390 });
     for (const width of [330, 1000]) {
       assert.match(await page.evaluate((wide) => window.drawingOf(document.querySelector('#series figure'), wide), width), />[^<]*\b1981\b/, `${start}, ${width}`);
     }
@@ -94,7 +90,7 @@ function focused() {
 
 for (const [width, colorScheme] of [[1400, 'light'], [390, 'dark']]) {
   test(`${width} pixels, ${colorScheme}: everything is reached by the Tab key in order, and is seen to have the focus`, async () => {
-    const { page } = await browser.openReport(sample.dataOf('optimisation'), { width, colorScheme });
+    const { page } = await openReport(sample.dataOf('optimisation'), { width, colorScheme });
     for (let step = 0, last = 1; step < last; ++step) {
       await page.keyboard.press('Tab');
       const { index, count, faults } = await page.evaluate(focused);

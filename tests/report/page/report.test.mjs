@@ -1,88 +1,8 @@
-// The report in a real browser: it shows what the data hold, complains of nothing and reads no name as HTML.
+// The report in a real browser: it shows what the data hold and complains of nothing.
 import assert from 'node:assert/strict';
-import { after, before, test } from 'node:test';
-import { openBrowser } from './browser.mjs';
+import { test } from 'node:test';
+import { blankCharts, openReport, withReport, zoomOf } from './open_report.mjs';
 import * as sample from './sample_data.mjs';
-
-let browser;
-before(async () => { browser = await openBrowser(); });
-after(() => browser.close());
-
-async function withReport(data, more, check) {
-  const { page, complaints } = await browser.openReport(data, more);
-  try {
-    await check(page);
-    assert.deepEqual(complaints, []);
-  } finally {
-    await page.context().close();
-  }
-}
-
-/** Titles of the charts that are not drawn: without a canvas, or with one of a single colour. */
-const blankCharts = (page) => page.$$eval('figure', (figures) => figures.filter((figure) => {
-  const canvas = figure.querySelector('canvas');
-  if (!figure.dataset.drawn || !canvas) return true;
-  const copy = new OffscreenCanvas(canvas.width, canvas.height).getContext('2d', { willReadFrequently: true });
-  copy.drawImage(canvas, 0, 0);
-  const pixels = new Uint32Array(copy.getImageData(0, 0, canvas.width, canvas.height).data.buffer);
-  return new Set(pixels).size < 10;
-}).map((figure) => figure.querySelector('figcaption').textContent));
-
-const sectionsOf = (page) => page.$$eval('main > section', (found) => found.map(({ id }) => id));
-const zoomOf = (page, figure) => page.evaluate((element) => window.drawnOptions(element).dataZoom.map(({ start, end }) => [start, end])[0], figure);
-
-const kOptimisation = ['series', 'parameters', 'results', 'compared', 'progress', 'histories', 'dotty', 'good-sets', 'failures', 'run', 'summary'];
-/** Names are text wherever they stand, tables that open later and tooltips included. */
-async function checkHostile(page) {
-  const shown = await page.evaluate(() => document.getElementById('report').textContent);
-  for (const text of sample.kHostile) assert.ok(shown.includes(text), text);
-  for (const figure of (await page.$$('figure')).slice(-4)) {
-    await figure.scrollIntoViewIfNeeded();
-    await (await figure.$('.canvas')).hover({ position: { x: 180, y: 60 } });
-  }
-  await page.$$eval('details', (all) => all.forEach((details) => { details.open = true; }));
-  assert.equal(await page.locator('#report :is(script, img, svg, iframe)').count(), 0);
-  assert.equal(await page.evaluate(() => window.harm), undefined);
-}
-
-const cases = {
-  'a search': [sample.dataOf('optimisation'), 3 + 2 + 2 + 2 + 2, kOptimisation],
-  'a search by few evaluations with two series': [sample.twoSeries(), 6 + 1 + 2 + 2 + 2,
-    kOptimisation.filter((id) => id !== 'failures')],
-  'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 2 + 3 + 1 + 5 + 2, ['band', 'sample-sensitivity', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
-  'GLUE': [sample.dataOf('glue'), 1 + 4 + 3 + 1 + 5 + 2 + 2, ['band', 'glue', 'sample-sensitivity', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
-  'DREAM': [sample.dataOf('dream'), 2 + 12 + 4 + 3 + 2, ['band', 'posterior', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
-  'DREAM with hostile names': [sample.hostile(sample.dataOf('dream')), 23, null, true],
-  'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
-  'Sobol indices': [sample.dataOf('sobol'), 4 + 5 + 6 + 2, ['sobol', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'run', 'summary']],
-  'Sobol indices with hostile names': [sample.hostile(sample.dataOf('sobol')), 17, null, true],
-  'a Morris screening': [sample.dataOf('screening'), 4 + 3, ['morris', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
-  'scenario runs': [sample.dataOf('scenarios'), 4 + 1 + 2, ['series', 'parameters', 'results', 'compared', 'progress', 'dotty', 'run', 'summary']],
-  'a run without an evaluation': [sample.empty(), 0, ['run']],
-  'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
-  'a search by four objectives with hostile names': [sample.hostile(sample.withTables(4)), 5 + 2 + 2 + 11, ['front', 'repetitions', 'estimate', ...kOptimisation], true],
-  'an uncertainty analysis with hostile names': [sample.hostile(sample.dataOf('uncertainty')), 14, null, true],
-  'a Morris screening with hostile names': [sample.hostile(sample.dataOf('screening')), 7, null, true],
-  'a sensitivity analysis with hostile names': [sample.hostile(sample.dataOf('sensitivity')), 7, null, true],
-};
-
-for (const [name, [data, charts, expected, text]] of Object.entries(cases)) {
-  test(`${name}: every chart drawn, wide and narrow, light and dark`, async () => {
-    await withReport(data, { colorScheme: 'light' }, async (page) => {
-      assert.equal(await page.locator('.broken').count(), 0);
-      assert.equal(await page.locator('figure').count(), charts);
-      if (expected) assert.deepEqual(await sectionsOf(page), expected);
-      for (const width of [1280, 400]) {
-        await page.setViewportSize({ width, height: 900 });
-        await page.evaluate(() => new Promise((painted) => { requestAnimationFrame(() => requestAnimationFrame(painted)); }));
-        assert.deepEqual(await blankCharts(page), []);
-        assert.equal(await page.evaluate(() => document.documentElement.scrollWidth), width, 'nothing reaches out of the window');
-        await page.emulateMedia({ colorScheme: 'dark' });
-      }
-      if (text) await checkHostile(page);
-    });
-  });
-}
 
 test('a chart zooms by dragging and by the wheel, is reset, and changes to a logarithmic axis', async () => {
   await withReport(sample.dataOf('optimisation'), {}, async (page) => {
@@ -114,31 +34,6 @@ test('a chart zooms by dragging and by the wheel, is reset, and changes to a log
     await (await figure.$('button[aria-pressed]')).click();
     assert.equal(await page.evaluate((element) => window.drawnOptions(element).yAxis[0].type, figure), 'log');
     assert.deepEqual(await blankCharts(page), []);
-  });
-});
-
-test('what can be fixed is not said to be surer than the sample can show', async () => {
-  const screening = sample.dataOf('screening');
-  const template = screening.morris[0].parameters[0];
-  const fixed = (name, more) => ({ ...template, name, verdict: 'fix', share: [0.01, 0.01, 0.02], muStar: [1, 1, 1], effects: 30, ...more });
-  for (const one of screening.morris) {
-    one.parameters = [fixed('inert', { muStar: [0, 0, 0], certainty: null }), fixed('weak', { certainty: 1 }), fixed('some', { certainty: 0.98 })];
-  }
-  await withReport(screening, {}, async (page) => {
-    const text = await page.locator('#morris').textContent();
-    assert.match(text, /Without any effect in 30 or more steps: what acts in less than 9\.5 % of the space may have gone unseen/);
-    assert.match(text, /weak\u2069 \(at most 2 % of the largest \u03bc\*, in all bootstrap samples\)/);
-    assert.match(text, /some\u2069 \(at most 2 % of the largest \u03bc\*, sure to 98 %\)/);
-  });
-  const sobol = sample.dataOf('sobol');
-  const [first, second] = sobol.sobol.outputs = [sobol.sobol.outputs.at(-1), structuredClone(sobol.sobol.outputs.at(-1))];
-  first.total = first.total.map((index, place) => (place === 0 ? [0, 0, 0, 64] : index));
-  second.name = 'another';
-  for (const key of ['first', 'total', 'interactions', 'sumOfFirst']) second[key] = second[key].map(([value, , , blocks]) => [value, null, null, blocks]);
-  await withReport(sobol, {}, async (page) => {
-    const text = await page.locator('#sobol').textContent();
-    assert.match(text, /Can be fixed, .*\(no effect in any block\)\. What acts in less than 4\.57 % of the space may have gone unseen in 64 blocks/);
-    assert.match(text, /anotherWhich parameters can be fixed is not said, as the indices have no limits/);
   });
 });
 
@@ -208,7 +103,7 @@ test('a print has every chart, in light colours, and leaves the screen as it was
 });
 
 test('of many charts those in view are drawn, the others when they come into view, and all for a print', async () => {
-  const { page } = await browser.openReport(sample.manyParameters(60));
+  const { page } = await openReport(sample.manyParameters(60));
   const drawn = () => page.locator('figure[data-drawn]').count();
   const all = await page.locator('figure').count();
   assert.ok(all > 100 && await drawn() > 0 && await drawn() < 20, `${await drawn()} of ${all}`);
@@ -264,191 +159,8 @@ test('20 000 evaluations and 20 years of days are drawn thinned and counted in f
   });
 });
 
-test('a band breaks at its gaps, shows every observed value and says of how many runs it is, without words of a search', async () => {
-  const data = sample.dataOf('uncertainty');
-  const [band] = data.band;
-  Object.assign(band, { gaps: [100], observedGaps: [200, 201], fewestRuns: 7, mostRuns: 9, runs: band.p5.map(() => 9) });
-  band.p95[0] = 8e5;
-  band.start = band.start.replace(/00:00$/, '07:00');
-  await withReport(data, {}, async (page) => {
-    const [, median, line, dots] = await page.evaluate(() => window.drawnOptions(document.querySelector('#band figure')).series.map(({ data }) => data));
-    assert.deepEqual(median.flatMap(([, value], place) => (value === null ? [place] : [])), [100]);
-    assert.equal(line.filter(([, value]) => value === null).length, 2);
-    assert.deepEqual(dots, [line[201]], 'the value between two gaps');
-    const drawn = () => page.evaluate(() => [/>800000</, /fill-opacity="0.45"/, /, \d\d:\d\d</].map((part) => part.test(window.drawingOf(document.querySelector('#band figure')))));
-    assert.deepEqual(await drawn(), [true, true, false]);
-    await page.locator('#band .canvas').focus();
-    await page.keyboard.press('+');
-    assert.deepEqual(await drawn(), [false, true, false], 'the axis follows what is zoomed in to, and begins with a date');
-    const shown = await page.locator('#report').textContent();
-    assert.ok(shown.includes('The quantiles are of 7 to 9 runs.'));
-    assert.ok(!/best so far|Progress|A wider bound/.test(shown));
-  });
-});
-
-test('GLUE says which parameters the observations tell something of, and how much of them lies in how wide a band', async () => {
-  const data = sample.dataOf('glue');
-  data.glue.distanceLimit = 0.1;
-  data.glue.parameters[0].distance = 0.5;
-  data.glue.parameters[1].distance = 0.01;
-  Object.assign(data.band[0], { inside: 0.75, n: 365, width: 2.5, relativeWidth: 0.8, unit: 'm3/s' });
-  await withReport(data, {}, async (page) => {
-    const shown = await page.locator('#glue').textContent();
-    assert.ok(shown.includes('The observations tell something of a (the most first). Behavioural values of b are distributed as all sets are'), shown);
-    assert.ok((await page.locator('#band').textContent()).includes('It is 2.5 m3/s wide on average at them, 0.8 of their standard deviation.'));
-  });
-  Object.assign(data.glue, { effective: 0, behavioural: 0, distanceLimit: null });
-  await withReport(data, {}, async (page) => {
-    assert.equal(await page.locator('#glue figure').count(), 0);
-    assert.ok((await page.locator('#glue').textContent()).includes('neither quantiles nor bands'));
-  });
-});
-
-test('a point of a front is picked in the chart, by keyboard and in the table, and its parameters and hydrograph are shown', async () => {
-  const data = sample.withTables(2);
-  const { front } = data;
-  Object.assign(data.estimate, { lower95: [3.9, -20], upper95: [4.1, 20], correlation: [[1, -0.97], [-0.97, 1]] });
-  data.parameters[1].nearBound = 'lower';
-  await withReport(data, {}, async (page) => {
-    const shown = await page.locator('#front').innerText();
-    for (const text of ['The best gauge 1 is 0.5 (evaluation 1). gauge 2 is 2.5 there, 400 % above its best, 0.5.', 'A suggestion for a compromise is evaluation 11: gauge 1 0.777, 55.4 % above its best; gauge 2',
-      'nearest to the ideal one', 'no more than a suggestion', 'The front still grew: its hypervolume by 10 %']) assert.ok(shown.replace(/[\u2068\u2069]/g, '').includes(text), `${text}: ${shown}`);
-    const figure = page.locator('#front figure').first();
-    const hydrograph = page.locator('#front figure', { hasText: 'Simulated and observed: flow' });
-    const picked = async () => [await page.locator('#front h3', { hasText: 'picked' }).textContent(),
-      await figure.evaluate((element) => window.drawnOptions(element).series.find(({ id }) => id === 'picked0').data[0][2]),
-      await hydrograph.evaluate((element) => { const { data: points } = window.drawnOptions(element).series.find(({ id }) => id === 'picked'); return points.length > 0 ? Number(points[1].toPrecision(6)) : null; })];
-    const expected = (set) => [`The point that is picked: evaluation ${front.numbers[set]}`, set, front.series.find(({ number }) => number === front.numbers[set])?.values[0] ?? null];
-    const isPicked = async (set, how) => {
-      const [title, place, value] = await picked();
-      const [wantedTitle, wantedPlace, wanted] = expected(set);
-      assert.deepEqual([title, place, value], [wantedTitle, wantedPlace, wanted === null ? null : Number(wanted.toPrecision(6))], how);
-    };
-    await isPicked(10, 'at first the suggestion');
-    await figure.locator('.canvas').focus();
-    await page.keyboard.press('+');
-    await page.keyboard.press('ArrowRight');
-    await isPicked(11, 'by keyboard');
-    assert.deepEqual(await zoomOf(page, await figure.elementHandle()), [25, 75], 'the chart stays zoomed in');
-    assert.match(await page.locator('#front').textContent(), /The series of evaluation 12 is not kept: those of 10 of the 20 points of the front are/);
-    await page.keyboard.press('Escape');
-    const [x, y] = await figure.evaluate((element) => {
-      const { left, top } = element.querySelector('.canvas').getBoundingClientRect();
-      const drawing = new DOMParser().parseFromString(window.drawingOf(element, element.querySelector('.canvas').clientWidth), 'image/svg+xml');
-      const dot = drawing.querySelector('path[ecmeta_series_index="1"][ecmeta_data_index="19"][transform^="matrix"]');
-      const [, , , , across, down] = dot.getAttribute('transform').match(/-?[\d.]+/g).map(Number);
-      return [left + across, top + down];
-    });
-    await page.mouse.click(x, y);
-    await isPicked(19, 'by a click on the last dot');
-    await page.locator('#front details.view summary').click();
-    await page.locator('#front details.view button', { hasText: /^4$/ }).press('Enter');
-    await isPicked(3, 'in the table');
-    assert.equal(await page.locator('#front details.view [aria-pressed="true"]').textContent(), '4');
-    const parameters = page.locator('[aria-label="Parameters of the point that is picked"] td').first();
-    assert.equal(Number(await parameters.textContent()), Number(front.parameterValues[0][3].toPrecision(8)));
-    assert.deepEqual(await blankCharts(page), []);
-
-    const words = (await page.locator('#repetitions .findings').innerText()).replace(/[\u2068\u2069]/g, '');
-    for (const text of ['2 of 3 repetitions ended within 1 % of the least value', 'These 2 agree in the value, but not in b (1 to 4, 60 % of its range)']) assert.ok(words.includes(text), words);
-    const courses = await page.locator('#repetitions figure').first().evaluate((element) => window.drawnOptions(element).series.map(({ data: steps }) => steps.at(-1)));
-    const bestOf = (number) => data.repetitions.stretches.filter(([of]) => of === number).flatMap(([, first, last]) => data.evaluations.aggregate.slice(first - 1, last)).filter((value) => value !== null).reduce((a, b) => Math.min(a, b));
-    assert.deepEqual(courses.map(([, value]) => value), [1, 2, 3].map(bestOf), 'each course is that of its own stretches');
-    const limits = (await page.locator('#estimate .findings').innerText()).replace(/[\u2068\u2069]/g, '');
-    for (const text of ['Well determined, their limits less than 10 % of the range between the bounds apart: a (2 %)', 'Hardly determined, their limits at least 50 % of the range apart: b (800 %)', 'a and b (correlation \u22120.97)', 'At a bound, where the limits say little: b (lower)']) assert.ok(limits.includes(text), limits);
-  });
-});
-
-test('repetitions of a search for a front are compared by its hypervolume', async () => {
-  await withReport(sample.withTables(4), {}, async (page) => {
-    const words = (await page.locator('#repetitions').innerText()).replace(/[\u2068\u2069]/g, '');
-    for (const text of ['least 1.2, median 1.5, greatest 1.99; that of all 2', '1 of 3 repetitions come within 1 % of the hypervolume of all']) assert.ok(words.includes(text), words);
-    assert.ok(!words.includes('aggregate'), words);
-    const drawn = await page.locator('#repetitions figure').first().evaluate((element) => window.drawnOptions(element).series[0].data);
-    assert.deepEqual(drawn.map(([volume]) => volume), [1.99, 1.5, 1.2]);
-  });
-});
-
-/** A posterior of so many dimensions, those of a short run again and again. */
-function ofDimensions(count) {
-  const { posterior } = sample.dataOf('dream');
-  const own = posterior.dimensions;
-  posterior.dimensions = Array.from({ length: count }, (_, place) => ({ ...own[place % own.length], name: `p${place}` }));
-  posterior.correlations = posterior.dimensions.map((_, row) => posterior.dimensions.map((__, column) => (row === column ? 1 : row + column === count - 1 ? -0.9 : 0.1)));
-  return posterior;
-}
-
-test('chains say whether they have converged, what to do, which parameters trade off, and how much lies in the bands', async () => {
-  const data = sample.dataOf('dream');
-  data.posterior.tradeOffs = ['sigma0 of flow and phi of flow trade off: a correlation of -0.86'];
-  Object.assign(data.band[1], { inside: 1 });
-  const { burnIn } = data.posterior;
-  await withReport(data, {}, async (page) => {
-    const shown = await page.locator('#posterior').textContent();
-    assert.equal(await page.locator('#posterior .findings .warning').count(), 1);
-    assert.match(shown, /The chains have not converged: R-hat is above 1\.05 for .*\bb \(\d\.\d/);
-    for (const text of ['sigma0 of flow and phi of flow trade off: a correlation of -0.86',
-      'holds 100 % of 365 observed values; it should hold about 90 %. It is wider', 'what follows is not the posterior yet', `4 chains of 121 generations; the first ${burnIn} are burn-in`]) assert.ok(shown.includes(text), text);
-    const shaded = await page.$$eval('#posterior figure', (figures) => figures.map((figure) => window.drawnOptions(figure)?.series[0].markArea?.data?.[0]?.[1]?.xAxis).filter((end) => end));
-    assert.deepEqual(shaded, Array(5).fill(burnIn), 'the burn-in of each trace');
-    const limits = await page.$$eval('#posterior figure', (figures) => figures.map((figure) => window.drawnOptions(figure)?.series[0].markLine?.data?.[0]?.yAxis).filter((limit) => limit));
-    assert.deepEqual(limits, [1.05, 400]);
-    assert.ok(!shown.includes('The data have narrowed'), 'what chains that are apart have not found');
-  });
-  Object.assign(data.posterior, { state: 'reached', findings: ['The chains have converged'], advice: [], tradeOffs: [] });
-  Object.assign(data.band[1], { inside: 0.91 });
-  data.posterior.dimensions.forEach((dimension, place) => Object.assign(dimension, { narrowing: [0.3, 0.95, 0.05, 0.2][place], isHardlyNarrower: place === 1 }));
-  await withReport(data, {}, async (page) => {
-    const shown = await page.locator('#posterior').textContent();
-    assert.equal(await page.locator('#posterior .findings .good').count(), 1);
-    for (const text of ['about the 90 % that it should', 'No two parameters trade off', 'The data have narrowed \u2068a\u2069 most: its 5 to 95 % range is 30 %', 'They say little of \u2068b\u2069']) assert.ok(shown.includes(text), text);
-    assert.ok(!shown.includes('not the posterior yet'));
-  });
-  data.band.push({ ...data.band[1], inside: 0.8, n: 1000 });
-  Object.assign(data.band[1], { inside: 0.8, n: 10 });
-  await withReport(data, {}, async (page) => {
-    const shown = await page.locator('#posterior').textContent();
-    for (const text of ['holds 80 % of 10 observed values; it should hold about 90 %, but of so few values this may be chance', 'holds 80 % of 1\u202f000 observed values; it should hold about 90 %. It is too narrow']) assert.ok(shown.includes(text), text);
-  });
-});
-
-test('chains that ended in burn-in, and those whose other tables cannot be read, are shown alone', async () => {
-  const data = sample.dataOf('dream');
-  const { posterior } = data;
-  const known = ['mean', 'standardDeviation', 'mostProbable', 'rHat', 'effectiveSize', 'narrowing'];
-  for (const dimension of posterior.dimensions) {
-    for (const name of known) dimension[name] = null;
-    for (const name of ['quantiles', 'priorQuantiles', 'edges', 'posterior', 'prior', 'rHats', 'effectiveSizes', 'draws']) dimension[name] = [];
-  }
-  Object.assign(posterior, { state: undefined, findings: undefined, tradeOffs: undefined, correlations: [], checkedRuns: [], burnIn: 129, states: 0, acceptance: null, chainAcceptance: [null, null, null, null] });
-  data.band = [];
-  await withReport(data, {}, async (page) => {
-    assert.equal(await page.locator('#posterior figure').count(), 5);
-    assert.deepEqual(await blankCharts(page), []);
-    assert.match(await page.locator('#posterior').textContent(), /There is no posterior: the chains have not come far enough/);
-  });
-});
-
-test('of many parameters the pairs with the strongest correlations are drawn, and others can be chosen', async () => {
-  const data = sample.dataOf('dream');
-  data.posterior = ofDimensions(30);
-  await withReport(data, {}, async (page) => {
-    const pressed = () => page.$$eval('#posterior .picks [aria-pressed="true"]', (buttons) => buttons.map((button) => button.textContent));
-    const grids = () => page.locator('#posterior figure', { hasText: 'Parameters against one another' }).evaluate((figure) => window.drawnOptions(figure).grid.length);
-    assert.deepEqual(await pressed(), ['p0', 'p1', 'p2', 'p3', 'p4', 'p5', 'p6', 'p7']);
-    const figure = page.locator('#posterior figure', { hasText: 'Parameters against one another' });
-    await figure.scrollIntoViewIfNeeded();
-    await page.locator('#posterior .picks button', { hasText: /^p29$/ }).click();
-    assert.deepEqual((await pressed()).at(-1), 'p29');
-    assert.equal((await pressed()).length, 8);
-    await page.locator('#posterior .picks button', { hasText: /^p29$/ }).click();
-    assert.equal(await grids(), 49);
-    assert.deepEqual(await blankCharts(page), []);
-  });
-});
-
 test('data of another format are refused in words', async () => {
-  const { page } = await browser.openReport({ ...sample.empty(), format: 2 });
+  const { page } = await openReport({ ...sample.empty(), format: 2 });
   assert.match(await page.locator('.broken').textContent(), /format 2; this page reads format 1/);
   await page.context().close();
 });
