@@ -34,8 +34,9 @@ constexpr std::string_view kHelp = R"(
 Calibrates and analyses a simulation model as the setup file (KDX format) says.
 
   //qmon           shows the run's progress on this terminal
-  --check SETUP    reads and checks the setup, runs the model once with the
-                   initial values, shows what was read and computed, and stops
+  --check SETUP    reads and checks the setup, runs the model once (with the
+                   initial values, if the task can), shows what was read and
+                   computed, and stops
   --new [FOLDER]   writes a small setup that runs, with its model and data
   --keyword        names every keyword of a setup, as SECTION/Keyword
   --keyword NAME   explains a keyword or a section

@@ -151,6 +151,8 @@ TEST(SetupCheck, RunsASetOfTheTaskWhereInitialValuesThatItDoesWithoutCannotBeRun
       {3, "Uncertainty_Type = 1", "Uncertainty_Type = 1\nRedraw_Infeasible = 1", kInstead},
       {3, "Uncertainty_Type = 1", "Uncertainty_Type = 'GLUE'\n[GLUE]\nBehavioural_Share = 0.5\n[/GLUE]", kInstead},
       {3, "Uncertainty_Type = 1", "Uncertainty_Type = 'DREAM'\n[DREAM]\nLikelihood = 'normal'\n[/DREAM]", kInstead},
+      {2, "Include_Initial_Parameters = 1", "Include_Initial_Parameters = 0", kInstead},
+      {2, "", "", "Warning: ", "The evaluation of the initial values failed: parameter constraints violated\n"},
       {0, "", "", "Warning: ", "The evaluation of the initial values failed: parameter constraints violated\n"},
       {1, "", "", "", "The evaluation of the initial values failed: parameter constraints violated\n"},
   };

@@ -91,8 +91,7 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
              .meaning =
                  "1: sets that violate a constraint, or for which an equation has no finite value, are drawn again "
                  "until all sets can be run. 0: they are not run and count as failed. No effect on DREAM, which "
-                 "rejects "
-                 "them without a model run in any case."}),
+                 "rejects them without a model run in any case."}),
         choice<UncertaintySection>(
             [](UncertaintySection& s, const SetupValue& value) {
               const bool isSteps = equalIgnoringCase(std::get<std::string>(value), kBandTimesNames[1].name);

@@ -105,7 +105,7 @@ std::vector<std::size_t> mostNarrowed(std::span<const DimensionFigures> figures)
   std::vector<std::size_t> order(figures.size());
   std::iota(order.begin(), order.end(), std::size_t{0});
   if (order.size() <= kMostListed) return order;
-  const auto key = [&](std::size_t j) { return std::isnan(figures[j].narrowing) ? INFINITY : figures[j].narrowing; };
+  const auto key = [&](std::size_t j) { return std::isnan(figures[j].narrowing) ? std::numeric_limits<double>::infinity() : figures[j].narrowing; };
   std::ranges::stable_sort(order, std::less(), key);
   order.resize(kMostListed);
   std::ranges::sort(order);

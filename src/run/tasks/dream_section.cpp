@@ -356,8 +356,8 @@ void readDreamSection(const SetupSection& section, std::span<const OutputMeasure
   settings.place = dream.location(kLikelihoodKeyword);
   checkTerms(dream, settings.errors);
   const std::vector<std::size_t> compared = measuresOfLikelihood(measures, objectives);
-  if (!settings.objectiveName.empty()) {
-    settings.objective = numberOfObjective(dream, settings.objectiveName, objectives);
+  if (settings.objectiveName) {
+    settings.objective = numberOfObjective(dream, *settings.objectiveName, objectives);
   }
   checkDream(dream, settings, objectives.size(), !compared.empty());
   const LikelihoodForm form = *settings.errors.form;

@@ -33,8 +33,8 @@ struct DreamSection {
   std::map<std::size_t, ErrorModelSettings>
       own;                     ///< of an output measure, by its number from 1; what it leaves open is as above
   std::int32_t objective = 0;  ///< of Likelihood = 'objective': its number; 0: the aggregate
-  std::string objectiveName;   ///< as the setup gives it, if it does not give the number
-  std::string place;           ///< of the likelihood, "setup.kdx:14:9"
+  std::optional<std::string> objectiveName;  ///< as the setup gives it, if it does not give the number
+  std::string place;                         ///< of the likelihood, "setup.kdx:14:9"
 };
 
 inline constexpr std::string_view kLikelihoodKeyword = "Likelihood";

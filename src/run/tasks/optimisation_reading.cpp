@@ -130,7 +130,7 @@ std::vector<std::string> OptimisationTask::neededSections(const SetupSection& ta
 void OptimisationTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("OPTIMISATION_ALGORITHM");
   section.read(optimisationSection(), *this);
-  if (surrogateUse != SurrogateUse::no && surrogateUse != SurrogateUse::yes) {
+  if (!isSearch()) {
     section.warn(kSurrogateKeyword, "neither 0 nor 1, no search will be run");
   }
   readMethod(reading, section);
@@ -183,7 +183,7 @@ void OptimisationTask::warnOfUnusedSample(const SetupSection& section) const {
 void OptimisationTask::takeGivenValues(const TaskReading& reading, const SetupSection& section) {
   std::string reason;
   sampleText_ = readTextFile(initialSample.fileName, reason);
-  if (!sampleText_) return;  // likewise
+  if (!sampleText_) return;  // refused before
   const SearchSpace space = BuildSearchSpace(reading.parameters);
   GivenSample sample;
   try {

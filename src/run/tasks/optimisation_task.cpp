@@ -20,13 +20,18 @@ namespace {
 
 constexpr std::string_view kWhatGivenSets = "given sets of the initial sample";
 
-/// Gives every set the value of a failed run.
+/// Gives every set the value of a failed run, and keeps the sets.
 class NoModel final : public Evaluator {
  public:
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets,
                                                       DispatchMode /*mode*/) override {
+    sets_.insert(sets_.end(), sets.begin(), sets.end());
     return std::vector<EvaluationResult>(sets.size());
   }
+  const std::vector<ParameterSet>& sets() const { return sets_; }
+
+ private:
+  std::vector<ParameterSet> sets_;
 };
 
 void logValues(RunLog& log, std::string_view heading, std::span<const std::string> names,
@@ -193,21 +198,36 @@ SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasib
   return problem;
 }
 
-/// Begins the same search with a generator of its own and without a model.
+/// Begins the same search with a generator of its own and without a model. Returns the sets that it starts from.
+std::vector<ParameterSet> OptimisationTask::startOf(const SearchSpace& space, const Feasibility& feasibility,
+                                                    std::int32_t seed) const {
+  UniformGenerator random(seed);
+  NoModel evaluator;
+  SearchProblem problem = problemOf(space, feasibility, evaluator, random);
+  ParetoProblem pareto;
+  problem.pareto = &pareto;
+  method->make(std::move(problem))->initialise();
+  return evaluator.sets();
+}
+
+bool OptimisationTask::isSearch() const {
+  return surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
+}
+
 void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
   if (method->facts().usesResiduals || usesSurrogate()) lapack();  // missed before the model runs, if ever
   const bool drawsAnySet = !feasibility.isTested() && initialSample.generation != SampleGeneration::fromFile;
-  const bool isSearch = surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
-  if (drawsAnySet || !isSearch || !earlierSearches_.empty()) return;            // a search that is continued had begun
+  if (drawsAnySet || !isSearch() || !earlierSearches_.empty()) return;          // a search that is continued had begun
   const std::int32_t samples = feasibility.isTested() ? repetitions.count : 1;  // otherwise all are alike
-  for (std::int32_t i = 0; i < samples; ++i) {
-    UniformGenerator random(repetitionSeed(randomSeed, i));
-    NoModel evaluator;
-    SearchProblem problem = problemOf(space, feasibility, evaluator, random);
-    ParetoProblem pareto;
-    problem.pareto = &pareto;
-    method->make(std::move(problem))->initialise();
-  }
+  for (std::int32_t i = 0; i < samples; ++i) startOf(space, feasibility, repetitionSeed(randomSeed, i));
+}
+
+std::optional<ParameterSet> OptimisationTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {
+  if (!isSearch()) return std::nullopt;
+  const std::vector<ParameterSet> start = startOf(space, feasibility, randomSeed);
+  if (std::ranges::find(start, space.initial) != start.end()) return std::nullopt;
+  const auto first = std::ranges::find_if(start, [&](const ParameterSet& set) { return !feasibility.violation(set); });
+  return first == start.end() ? std::nullopt : std::optional(*first);
 }
 
 SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator, std::size_t index,
@@ -294,7 +314,7 @@ void OptimisationTask::logEnd(const TaskContext& context, const SearchSummary& s
 }
 
 TaskOutcome OptimisationTask::run(const TaskContext& context) {
-  if (surrogateUse != SurrogateUse::no && surrogateUse != SurrogateUse::yes) return {std::string(kEndOfTask)};
+  if (!isSearch()) return {std::string(kEndOfTask)};
 
   if (method->facts().usesResiduals) {
     fittings_.resize(static_cast<std::size_t>(repetitions.count));

@@ -35,6 +35,7 @@ class OptimisationTask final : public Task {
   std::optional<OneSlotOnly> needsOneSlot() const override;
   bool judgesByAggregate() const override { return !method || !method->facts().findsFront; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   /// A search by residuals needs them in every result; one for a front shows those of the front.
   bool keepsSimulatedValues() const override { return method && (method->facts().usesResiduals || keepsFrontSeries_); }
@@ -59,6 +60,8 @@ class OptimisationTask final : public Task {
   RepetitionSettings repetitions;
 
  private:
+  bool isSearch() const;
+  std::vector<ParameterSet> startOf(const SearchSpace& space, const Feasibility& feasibility, std::int32_t seed) const;
   /// Whether a surrogate model assists the search.
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
   void warnOfUnusedSample(const SetupSection& section) const;
