@@ -138,6 +138,7 @@ SearchStatus Glm::initialise() {
 
 void Glm::startNext() {
   current_ = std::move(starts_.front());
+  leastOfRuns_ = std::min(leastOfRuns_, current_->sum);
   starts_.pop_front();
   jacobian_.clear();
   differences_.reset();
@@ -173,6 +174,12 @@ void Glm::end(std::string message) {
     if (!isAtLower && !(best_->set[j] >= b.upper[j])) continue;
     note(fmt::format("The estimate of {} is at its {} bound", problem_.residuals->space.names[j],
                      isAtLower ? "lower" : "upper"));
+  }
+  if (best_ && best_->sum < leastOfRuns_) {
+    note(fmt::format(
+        "The best set, evaluation {}, is one of the differences: sum of squares {}, {:.3g} % less than where "
+        "the runs have come to. A search with it as the initial set goes on from there",
+        best_->result.number, formatReal(best_->sum), 100.0 * (1.0 - best_->sum / leastOfRuns_)));
   }
   summary_.terminationMessage = std::move(message);
 }
@@ -243,6 +250,10 @@ bool Glm::makeJacobian() {
   differences_ = std::move(made);
   needsJacobian_ = false;
   updates_ = 0;
+  constexpr double kNegligible = 1.0e-6;  // where a run has come to its minimum, a difference is no better
+  for (const std::optional<Point>& point : points) {
+    if (point && point->sum < (1.0 - kNegligible) * best_->sum) noteBest(*point);
+  }
   if (best_->result.number == current_->result.number) {
     ResidualFit& fit = *problem_.residuals->fit;
     fit.jacobian = differences_;
@@ -441,6 +452,7 @@ void Glm::accept(Point point, double lambda, double expected) {
                    formatReal(lambda), formatReal(point.sum), 100.0 * share));
   noteBest(point);
   current_ = std::move(point);
+  leastOfRuns_ = std::min(leastOfRuns_, current_->sum);
   lambda_ = std::max(kLeastLambda, lambda > 0.0 ? lambda : lambda_ / 10.0);
   judge(share, largest, reduction > kPoorGain * expected);
 }

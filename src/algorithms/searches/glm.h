@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <deque>
+#include <limits>
 #include <memory>
 #include <optional>
 #include <span>
@@ -46,7 +47,7 @@ struct GlmSettings {
 /// GlmLinearModel; between Jacobians made by differences they may be updated after Broyden (1965),
 /// doi:10.1090/S0025-5718-1965-0198670-6. A run that lacks a residual of the start counts as failed. A column without a
 /// run is that of the previous Jacobian, updated after Broyden; without one its parameter is held. The best set is that
-/// of the least sum of squares, prior included.
+/// of the least sum of squares, prior included, be it one of the differences.
 class Glm final : public SearchAlgorithm {
  public:
   Glm(const GlmSettings& settings, SearchProblem problem);
@@ -100,6 +101,7 @@ class Glm final : public SearchAlgorithm {
   SearchSummary summary_;
   std::deque<Point> starts_;  ///< not used yet, the best first
   std::optional<Point> best_;
+  double leastOfRuns_ = std::numeric_limits<double>::infinity();  ///< the least sum to which a run has come
   std::vector<double> units_;  ///< the finest of each residual
 
   // Of the current run:

@@ -99,6 +99,19 @@ TEST(Glm, FitsALinearModelInOneIteration) {
 }
 
 /// Where the unbounded optimum lies outside, that of the others is found with the parameter at its bound.
+/// In a valley as narrow as a set of the differences, to which no step leads.
+TEST(Glm, TheBestSetIsTheOneOfTheLeastSumBeItADifference) {
+  const auto residualsOf = [](const ParameterSet& set) {
+    const bool isInValley = std::abs(set[0] - 5.2) < 1e-9;
+    return isInValley ? std::vector{-2.9, 0.0} : std::vector{set[0] - 2.0, 1.0};
+  };
+  const GlmTrial trial = glmSearch({{-10}, {10}, {5}}, residualsOf, {.minChange = 1e-9});
+  EXPECT_NEAR(trial.summary.best.at(0), 5.2, 1e-9);
+  EXPECT_EQ(trial.summary.bestResult.number, 2);
+  EXPECT_NEAR(trial.fit.set.at(0), 5.2, 1e-9);
+  EXPECT_THAT(notesOf(trial), HasSubstr("The best set, evaluation 2, is one of the differences: sum of squares 8.41"));
+}
+
 TEST(Glm, KeepsToBoundsThatAreActiveAtTheOptimum) {
   SearchBounds bounds = kParabolaBounds;
   bounds.upper[2] = 0.25;
