@@ -15,7 +15,8 @@ constexpr int kFewestEvaluations = 20;  ///< below that halves and tenths say no
 constexpr double kNoted = 1.0e-3;       ///< share of the hypervolume below which a rise is called small
 
 double widthOf(double ideal, double nadir) {
-  return nadir > ideal ? nadir - ideal : 1.0;
+  if (nadir > ideal) return nadir - ideal;
+  return ideal != 0.0 ? std::abs(ideal) : 1.0;
 }
 
 }  // namespace

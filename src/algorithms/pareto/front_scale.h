@@ -21,7 +21,7 @@ class FrontScale final {
   explicit FrontScale(std::span<const std::vector<double>> front, std::span<const double> reference = {})
       : FrontScale(PointTable(front), reference) {}
 
-  /// An objective without a range has the width 1.
+  /// An objective without a range has the width of its value, whatever its unit; of a value of 0 the width 1.
   std::vector<double> scaled(std::span<const double> values) const;
   const std::vector<double>& ideal() const { return ideal_; }
   const std::vector<double>& nadir() const { return nadir_; }

@@ -189,6 +189,17 @@ TEST(ParetoArchive, HoldsWhatNothingDominatesAndRemembersHowItCameAbout) {
   }
 }
 
+/// Two evaluations, of which the second is on the front alone: what it added does not depend on the unit.
+TEST(FrontScale, AFrontOfOneSetHasAScaleWhateverItsUnit) {
+  for (const double unit : {1.0e-6, 1.0, 1.0e6}) {
+    const std::vector<std::vector<double>> front{{2.0 * unit, -3.0 * unit}};
+    const FrontScale scale(front);
+    EXPECT_NEAR(scale.hypervolumeShare(front), 1.0, 1e-12);
+    const std::vector<std::vector<double>> before{{2.1 * unit, -3.0 * unit}};
+    EXPECT_NEAR(scale.hypervolumeShare(before), (1.1 - 0.05) / 1.1, 1e-9) << unit;
+  }
+}
+
 TEST(FrontScale, SuggestsTheSetNearestToTheIdealPointAndMeasuresTheCourse) {
   ParetoArchive archive;
   archive.add(1, {1.0}, {100.0, 0.02});
