@@ -1,8 +1,10 @@
 #include "report/report_repetitions.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <limits>
+#include <span>
 #include <string_view>
 
 #include <fmt/format.h>
@@ -15,42 +17,62 @@
 namespace mirevo {
 namespace {
 
-/// Columns of the table before those of the parameters, behind which the last one stands. That of the hypervolume is
-/// there if the search finds fronts.
+/// Columns of the table before those of the parameters, behind which the last one stands. The ones from kOptional on
+/// are there as the search and the version have them.
 constexpr std::string_view kColumns[] = {"Repetition", "Seed",  "Evaluations",     "Best_Evaluation",
                                          "Aggregate",  "Loops", "Start_Aggregate", "Hypervolume"};
-constexpr std::size_t kHypervolume = std::size(kColumns) - 1;
+constexpr std::size_t kOptional = 6;
 constexpr std::string_view kLastColumn = "Termination";
 
 double numberIn(const std::string& cell) {
   return realCell(cell).value_or(std::numeric_limits<double>::quiet_NaN());
 }
 
-/// The place of the first parameter's column; empty if this is another table.
-std::optional<std::size_t> firstParameterOf(const ReadTable& table, std::size_t parameterCount) {
-  const std::size_t count = table.columns.size();
-  if (count != kHypervolume + parameterCount + 1 && count != kHypervolume + parameterCount + 2) return std::nullopt;
-  const std::size_t first = count - parameterCount - 1;
-  const bool isIt =
-      table.columns.back() == kLastColumn && std::equal(kColumns, kColumns + first, table.columns.begin());
-  return isIt ? std::optional(first) : std::nullopt;
+/// Where the columns stand, in the order of kColumns.
+struct Places {
+  std::array<std::optional<std::size_t>, std::size(kColumns)> columns;
+  std::size_t firstParameter = 0;
+};
+
+/// Empty if this is another table.
+std::optional<Places> placesIn(const ReadTable& table, std::size_t parameterCount) {
+  if (table.columns.size() < kOptional + parameterCount + 1 || table.columns.back() != kLastColumn) return std::nullopt;
+  Places places;
+  places.firstParameter = table.columns.size() - parameterCount - 1;
+  // A parameter may have the name of a column, which stands before it.
+  const std::span<const std::string> names(table.columns.begin(), places.firstParameter);
+  std::size_t count = 0;
+  for (std::size_t i = 0; i < std::size(kColumns); ++i) {
+    const auto found = std::ranges::find(names, kColumns[i]);
+    if (found == names.end() && i < kOptional) return std::nullopt;
+    if (found == names.end()) continue;
+    places.columns[i] = static_cast<std::size_t>(found - names.begin());
+    ++count;
+  }
+  // More or fewer parameters than the setup has: a column before them is unknown, or one of these stands among them.
+  const bool hasOther = count < names.size() || table.columns[places.firstParameter] == kColumns[kOptional];
+  return hasOther ? std::nullopt : std::optional(places);
 }
 
-std::optional<ReportedRepetition> readRepetition(const std::vector<std::string>& cells, std::size_t firstParameter) {
-  const auto number = parseInteger(cells[0]);
-  const double aggregate = numberIn(cells[4]);
+std::optional<ReportedRepetition> readRepetition(const std::vector<std::string>& cells, const Places& places) {
+  const auto wholeIn = [&](std::size_t column) { return parseInteger(cells[*places.columns[column]]); };
+  const auto realIn = [&](std::size_t column) {
+    const std::optional<std::size_t> place = places.columns[column];
+    return place ? numberIn(cells[*place]) : std::numeric_limits<double>::quiet_NaN();
+  };
+  const auto number = wholeIn(0);
   if (!number) return std::nullopt;
   ReportedRepetition one{*number,
-                         parseInteger(cells[1]).value_or(0),
-                         parseInteger(cells[2]).value_or(0),
-                         parseInteger(cells[3]).value_or(0),
-                         aggregate,
-                         parseInteger(cells[5]).value_or(0),
+                         wholeIn(1).value_or(0),
+                         wholeIn(2).value_or(0),
+                         wholeIn(3).value_or(0),
+                         realIn(4),
+                         wholeIn(5).value_or(0),
                          {},
                          cells.back(),
-                         numberIn(cells[6])};
-  if (firstParameter > kHypervolume) one.hypervolume = numberIn(cells[kHypervolume]);
-  for (std::size_t i = firstParameter; i + 1 < cells.size(); ++i) one.parameters.push_back(numberIn(cells[i]));
+                         realIn(6),
+                         realIn(7)};
+  for (std::size_t i = places.firstParameter; i + 1 < cells.size(); ++i) one.parameters.push_back(numberIn(cells[i]));
   return one;
 }
 
@@ -79,10 +101,12 @@ std::vector<ReportedStretch> readStretches(const std::string& filePrefix, std::s
   return stretches;
 }
 
+/// As in the log: by those that have ended with a best set.
 NearlyEqual nearlyEqualOf(const std::vector<ReportedRepetition>& all) {
   double least = std::numeric_limits<double>::infinity();
   std::vector<double> starts;
   for (const ReportedRepetition& one : all) {
+    if (one.termination.empty() || one.best == 0) continue;
     if (one.aggregate < least) least = one.aggregate;
     starts.push_back(one.start);
   }
@@ -97,17 +121,17 @@ std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePr
   const auto text = readFileIfThere(path);
   if (!text) return std::nullopt;
   const ReadTable table = readDataTable(*text);
-  const auto firstParameter = firstParameterOf(table, parameterCount);
-  if (!firstParameter) {
+  const auto places = placesIn(table, parameterCount);
+  if (!places) {
     faults.push_back(fmt::format("The repetitions are not shown: {} is damaged, or of other parameters than the setup",
                                  fileNameOf(path)));
     return std::nullopt;
   }
   ReportedRepetitions found;
-  found.parameters.assign(table.columns.begin() + static_cast<std::ptrdiff_t>(*firstParameter),
+  found.parameters.assign(table.columns.begin() + static_cast<std::ptrdiff_t>(places->firstParameter),
                           table.columns.end() - 1);
   for (const std::vector<std::string>& cells : table.rows) {
-    if (auto one = readRepetition(cells, *firstParameter)) found.all.push_back(*std::move(one));
+    if (auto one = readRepetition(cells, *places)) found.all.push_back(*std::move(one));
   }
   if (found.all.size() < table.rows.size()) {
     faults.push_back(fmt::format("{} of {} cannot be read and left out",

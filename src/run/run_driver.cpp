@@ -385,7 +385,7 @@ std::optional<TaskOutcome> RunDriver::statisticsOfEarlyEnd() {
   const UnfinishedBatch made = evaluator_->takeUnfinished();
   const auto ofBatch =
       std::count_if(made.results.begin(), made.results.end(), [](const auto& result) { return result.ok(); });
-  const auto succeeded = config_.task->evaluationsInBatches().value_or(static_cast<int>(ofBatch));
+  const auto succeeded = config_.task->unfinishedEvaluations(made).value_or(static_cast<int>(ofBatch));
   if (succeeded == 0) return std::nullopt;
   auto outcome = config_.task->unfinishedOutcome(taskContext(), made);
   if (!outcome) return std::nullopt;

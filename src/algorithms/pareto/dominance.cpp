@@ -1,6 +1,7 @@
 #include "algorithms/pareto/dominance.h"
 
 #include <algorithm>
+#include <cmath>
 #include <limits>
 #include <numeric>
 
@@ -33,6 +34,10 @@ class CrowdedPoints final {
       for (std::size_t i = 1; i + 1 < order.size(); ++i) {
         distances_[order[i].point] += (order[i + 1].value - order[i - 1].value) / range;
       }
+    }
+    // A share of an infinite range may be no number, which has no place in an order.
+    for (double& distance : distances_) {
+      if (std::isnan(distance)) distance = 0.0;
     }
     return distances_;
   }

@@ -29,7 +29,7 @@ std::vector<int> nondominationRanks(std::span<const ObjectivePoint> points);
 /// The crowding distance of the same paper, of points of one rank: the sum over the objectives of the distance between
 /// the two neighbours of a point in that objective, as a share of its range over the points. Infinite for those at the
 /// ends of an objective; of equal values at an end, for the first in the order of the points. An objective without a
-/// range counts nothing.
+/// range counts nothing; a distance that is no number, as a range overflows, is 0.
 std::vector<double> crowdingDistances(const PointTable& points);
 inline std::vector<double> crowdingDistances(std::span<const std::vector<double>> points) {
   return crowdingDistances(PointTable(points));

@@ -7,6 +7,7 @@
 
 #include "algorithms/pareto/dominance.h"
 #include "algorithms/pareto/hypervolume.h"
+#include "common/rounded_text.h"
 
 namespace mirevo {
 namespace {
@@ -101,7 +102,7 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
   const double end = scale.hypervolumeShare(archive.front());
   const auto riseText = [](double from, double to) {
     if (to <= from) return std::string("did not grow");
-    return fmt::format("grew from {:.6g} to {:.6g} ({:.2g} %)", from, to, 100.0 * (to - from) / to);
+    return fmt::format("grew from {:.6g} to {:.6g} ({} %)", from, to, roundedText(100.0 * (to - from) / to, 2));
   };
   std::vector<std::string> lines;
   lines.push_back(fmt::format(
@@ -127,9 +128,9 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
         fmt::format("The hypervolume has come to rest; {} can tell whether there is a better front", others));
   } else {
     lines.push_back(
-        fmt::format("If it went on growing as it did, {} more evaluations would add about {:.2g} % to it. Such a trend "
+        fmt::format("If it went on growing as it did, {} more evaluations would add about {} % to it. Such a trend "
                     "is rough",
-                    count, 100.0 * rise / end));
+                    count, roundedText(100.0 * rise / end, 2)));
   }
   return lines;
 }

@@ -5,6 +5,7 @@
 
 #include <fmt/core.h>
 
+#include "common/rounded_text.h"
 #include "common/text.h"
 #include "evaluation/evaluation_result.h"
 
@@ -17,7 +18,7 @@ constexpr double kNoted = 1.0e-3;       ///< share of the best value below which
 /// "from 0.52 to 0.48 (7.7 %)"; the share is that of a positive value.
 std::string fallText(double from, double to) {
   std::string text = fmt::format("from {:.6g} to {:.6g}", from, to);
-  if (to > 0.0) text += fmt::format(" ({:.2g} %)", 100.0 * (from - to) / from);
+  if (to > 0.0) text += fmt::format(" ({} %)", roundedText(100.0 * (from - to) / from, 2));
   return text;
 }
 

@@ -9,6 +9,7 @@
 
 #include "algorithms/pareto/front_scale.h"
 #include "algorithms/searches/population_search.h"
+#include "common/rounded_text.h"
 
 namespace mirevo {
 
@@ -82,10 +83,10 @@ bool ParetoSearch::hasHypervolumeSettled() {
   const double now = scale.hypervolumeShare(archive.front());
   const double then = scale.hypervolumeShare(front);
   if (!(now > 0.0) || now - then >= settings_.hypervolumeChange * now) return false;
-  summary_.notes.push_back(
-      fmt::format("In the last {} evaluations the hypervolume of the front has grown by {:.2g} % (Hypervolume_Change: "
-                  "{:.2g} %)",
-                  window, 100.0 * (now - then) / now, 100.0 * settings_.hypervolumeChange));
+  summary_.notes.push_back(fmt::format(
+      "In the last {} evaluations the hypervolume of the front has grown by {} % (Hypervolume_Change: "
+      "{} %)",
+      window, roundedText(100.0 * (now - then) / now, 2), roundedText(100.0 * settings_.hypervolumeChange, 2)));
   return true;
 }
 

@@ -20,7 +20,7 @@ bool isNearAll(const RepetitionFront& front) {
   return front.hypervolume >= (1.0 - kNearlyEqualShare) * front.hypervolumeOfAll;
 }
 
-std::vector<std::string> fronts(std::span<const Repetition> repetitions, std::int32_t planned) {
+std::vector<std::string> frontLines(std::span<const Repetition> repetitions, std::int32_t planned) {
   std::vector<std::string> lines{repetitionHeading(repetitions.size(), planned)};
   lines.push_back(fmt::format("   {:>3} {:>11} {:>11} {:>7} {:>7} {:>12} {:>11}  {}", "No.", "seed", "evaluations",
                               "front", "of all", "hypervolume", "compromise", "why it stopped"));
@@ -63,8 +63,7 @@ std::string verdict(const std::vector<const Repetition*>& ended, double least, d
       std::ranges::count_if(ended, [](const Repetition* one) { return one->front->hypervolume == 0.0; });
   return fmt::format(
       "The search has not found the same front each time: {} of {} repetitions come within {:g} % of the hypervolume "
-      "of "
-      "all, and {}. For a single search to come near it: a larger budget or population, or another search",
+      "of all, and {}. For a single search to come near it: a larger budget or population, or another search",
       near, ended.size(), 100.0 * kNearlyEqualShare,
       behind > 0 ? fmt::format("{} behind the reference point altogether",
                                behind == 1 ? "one lies" : fmt::format("{} lie", behind))
@@ -89,8 +88,8 @@ void RepeatedFronts::describe(const ParetoArchive& ofAll, std::span<const double
   if (all.empty()) return;
   const FrontScale scale(all, reference);
   const double hypervolumeOfAll = scale.hypervolumeShare(all);
-  std::set<int> numbersOfAll;
-  for (const FrontMember& member : ofAll.members()) numbersOfAll.insert(member.number);
+  // Not by number: of equal values the front of all has the first alone, whichever repetition found it.
+  const std::set<std::vector<double>> valuesOfAll(all.begin(), all.end());
   for (std::size_t i = 0; i < repetitions.size(); ++i) {
     RepetitionFront& front = *repetitions[i].front;
     front.hypervolumeOfAll = hypervolumeOfAll;
@@ -100,7 +99,7 @@ void RepeatedFronts::describe(const ParetoArchive& ofAll, std::span<const double
     front.size = members.size();
     front.least = members.front().values;
     for (const FrontMember& member : members) {
-      front.sharedSize += numbersOfAll.count(member.number);
+      front.sharedSize += valuesOfAll.count(member.values);
       for (std::size_t k = 0; k < front.least.size(); ++k) front.least[k] = std::min(front.least[k], member.values[k]);
     }
     const auto distance = [&scale](const FrontMember& member) { return scale.distance(member.values); };
@@ -114,7 +113,7 @@ void RepeatedFronts::describe(const ParetoArchive& ofAll, std::span<const double
 
 std::vector<std::string> repeatedFrontLines(std::span<const Repetition> repetitions, const SearchSpace& space,
                                             std::span<const std::string> objectives, std::int32_t planned) {
-  std::vector<std::string> lines = fronts(repetitions, planned);
+  std::vector<std::string> lines = frontLines(repetitions, planned);
   std::vector<const Repetition*> ended;
   std::vector<double> hypervolumes;
   for (const Repetition& one : repetitions) {

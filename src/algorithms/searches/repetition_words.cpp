@@ -2,11 +2,13 @@
 
 #include <algorithm>
 #include <cmath>
+#include <iterator>
 #include <utility>
 
 #include <fmt/core.h>
 
 #include "algorithms/numbers/sample_summary.h"
+#include "common/rounded_text.h"
 #include "common/take_text.h"
 #include "common/text.h"
 
@@ -30,11 +32,15 @@ std::string whyItStopped(const Repetition& repetition) {
 }
 
 double rangeShare(const std::vector<const Repetition*>& repetitions, const SearchSpace& space, std::size_t k) {
-  const double range = space.upper[k] - space.lower[k];
+  const bool isInteger = space.transformation[k] == TransformationType::integer;
+  const double range = space.upper[k] - space.lower[k] - (isInteger ? 1.0 : 0.0);
   if (!(range > 0.0)) return 0.0;
   std::vector<double> values;
   values.reserve(repetitions.size());
-  for (const Repetition* repetition : repetitions) values.push_back(repetition->best[k]);
+  for (const Repetition* repetition : repetitions) {
+    const double value = repetition->best[k];
+    values.push_back(isInteger ? toModelScale(space, k, value) : value);
+  }
   const Spread spread = spreadOf(std::move(values));
   return (spread.greatest - spread.least) / range;
 }
@@ -55,6 +61,7 @@ std::vector<std::vector<double>> parameterSpreads(const std::vector<const Repeti
 namespace {
 
 constexpr std::size_t kMostNamed = 20;  // parameters in a sentence
+constexpr double kMostTimes = 100.0;    // of a value above which percents of it are not read
 
 std::vector<std::string> tableLines(std::span<const Repetition> repetitions, std::int32_t planned) {
   std::vector<std::string> lines{repetitionHeading(repetitions.size(), planned)};
@@ -131,7 +138,7 @@ class SpreadText final {
     return fmt::format(
         "None of the {} repetitions found anything better than {}, which says nothing of a minimum: the start may be "
         "one, or the search does not get away from it. A larger budget can tell{}",
-        ended_.size(), isOne ? "the set that all of them began with" : "the sets that it began with",
+        ended_.size(), isOne ? "the set that all of them began with" : "the sets that they began with",
         isOne ? ", or other starts (Include_Initial_Parameters = 0)" : "");
   }
 
@@ -150,10 +157,10 @@ class SpreadText final {
         fmt::format("The search has not found the same minimum each time: {} of {} repetitions ended within {} value",
                     near_.size(), ended_.size(), nearly_.text());
     const double above = values_.greatest - values_.least;
-    if (nearly_.isOfLeast && values_.least > 0.0) {
-      text += fmt::format(", and the worst {:.3g} % above it", 100.0 * above / values_.least);
+    if (nearly_.isOfLeast && above < kMostTimes * values_.least) {
+      text += fmt::format(", and the worst {} % above it", roundedText(100.0 * above / values_.least, 3));
     } else {
-      text += fmt::format(", and the worst {:.3g} above it", above);
+      text += fmt::format(", and the worst {} above it", roundedText(above, 3));
     }
     text += near_.size() == 1 ? ". As no other came near it, there may well be better values: "
                               : ". For a single search to find it more often: ";

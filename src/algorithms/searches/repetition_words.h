@@ -22,7 +22,8 @@ Spread spreadOf(std::vector<double> values);
 std::string repetitionHeading(std::size_t count, std::int32_t planned);
 /// Why it stopped, or that it has not ended.
 std::string whyItStopped(const Repetition& repetition);
-/// The share of its range that parameter k takes up in these best sets, on the search scale.
+/// The share of its range that parameter k takes up in these best sets, on the search scale, but an integer one with
+/// the values that runs had.
 double rangeShare(const std::vector<const Repetition*>& repetitions, const SearchSpace& space, std::size_t k);
 /// The parameters of these best sets on the model scale, each with its spread and share of its range, in percent.
 std::vector<std::vector<double>> parameterSpreads(const std::vector<const Repetition*>& repetitions,

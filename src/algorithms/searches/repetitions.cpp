@@ -3,15 +3,16 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdlib>
+#include <iterator>
 
 #include <fmt/core.h>
 
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/uniform_generator.h"
+#include "common/rounded_text.h"
 #include "common/run_files.h"
 
 namespace mirevo {
-namespace {}  // namespace
 
 std::int32_t repetitionSeed(std::int32_t seed, std::int32_t index) {
   constexpr std::int64_t kLargest = std::numeric_limits<std::int32_t>::max();
@@ -30,14 +31,15 @@ NearlyEqual nearlyEqual(double least, std::span<const double> starts) {
   std::ranges::copy_if(starts, std::back_inserter(known), [](double value) { return std::isfinite(value); });
   std::ranges::sort(known);
   const double fall = known.empty() ? 0.0 : std::max(0.0, sortedQuantile(known, 0.5) - least);
-  const double ofLeast = kNearlyEqualShare * std::max(0.0, least);
-  const double ofFall = kNearlyEqualFall * fall;
-  return {std::max(ofLeast, ofFall), ofLeast >= ofFall};
+  double share = kNearlyEqualShare * std::abs(least);
+  if (least < 0.0 && !known.empty()) share = std::min(share, kNearlyEqualShare * fall);
+  const double nearZero = kNearlyEqualFall * fall;
+  return {std::max(share, nearZero), least > 0.0 && share >= nearZero};
 }
 
 std::string NearlyEqual::text() const {
   return isOfLeast ? fmt::format("{:g} % of the least", 100.0 * kNearlyEqualShare)
-                   : fmt::format("{:.2g} of the least", tolerance);
+                   : fmt::format("{} of the least", roundedText(tolerance, 3));
 }
 
 DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchSpace& space) {

@@ -41,7 +41,7 @@ std::string seedsText(std::int32_t seed, std::int32_t count);
 struct RepetitionFront {
   double hypervolume = 0.0;             ///< on the scale of the front of all
   std::size_t size = 0;                 ///< sets
-  std::size_t sharedSize = 0;           ///< of them on the front of all
+  std::size_t sharedSize = 0;           ///< of them with values that are on the front of all
   std::vector<double> least = {};       ///< of each objective; empty without a front
   std::vector<double> compromise = {};  ///< the objectives of its best set; likewise
   double hypervolumeOfAll = 0.0;        ///< of the front of all
@@ -75,16 +75,18 @@ DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchS
 /// Which evaluations are whose, for programs.
 DataTable repetitionRowTable(std::span<const RepetitionStretch> stretches);
 
-/// Best values that differ from the least by no more than this share of it count as equal to it,
+/// Best values that differ from a least one above 0 by no more than this share of it count as equal to it; from one
+/// below 0, by no more than this share of its size and of the way to it from where the repetitions began, as 0 may lie
+/// anywhere then,
 inline constexpr double kNearlyEqualShare = 0.01;
-/// or than this share of the way to it from where the repetitions began, where that is more: 1 % of a least value near
-/// 0 would be next to nothing, and of a negative one anything.
-inline constexpr double kNearlyEqualFall = 0.001;
+/// or than this share of that way, where that is more: a share of a least value at 0 is nothing. So much numbers of 32
+/// bits resolve where the repetitions began, so that a poor start makes no other values equal.
+inline constexpr double kNearlyEqualFall = 1.0e-7;
 
 /// Which best values count as equal to the least.
 struct NearlyEqual {
   double tolerance = 0.0;  ///< above the least
-  bool isOfLeast = true;   ///< it is kNearlyEqualShare of the least value, and not of the way to it
+  bool isOfLeast = false;  ///< it is kNearlyEqualShare of the least value, which is above 0
 
   /// "1 % of the least", "0.0012 of the least"
   std::string text() const;

@@ -34,7 +34,9 @@ class DreamTask final : public Task {
   TaskOutcome run(const TaskContext& context) override;
   /// Of the generations that are complete.
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
-  std::optional<int> evaluationsInBatches() const override { return sampler_ ? sampler_->runs() : 0; }
+  std::optional<int> unfinishedEvaluations(const UnfinishedBatch& /*made*/) const override {
+    return sampler_ ? sampler_->runs() : 0;
+  }
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
   void continueFrom(const std::vector<EarlierSearch>& searches) override;
   std::vector<EarlierSearch> earlierSearches() const override { return earlierRuns_; }

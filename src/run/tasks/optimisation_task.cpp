@@ -278,12 +278,15 @@ const ResidualFitting* OptimisationTask::bestFitting() const {
   return fittings_.empty() ? nullptr : fittings_[repeated_ ? repeated_->bestEnded() : 0].get();
 }
 
-/// The same, or another one if that has no derivatives; nullptr if none has.
-const ResidualFitting* OptimisationTask::fittingWithDerivatives() const {
-  const ResidualFitting* const best = bestFitting();
-  if (best != nullptr && best->hasDerivatives()) return best;
-  const auto found = std::ranges::find_if(fittings_, [](const auto& one) { return one && one->hasDerivatives(); });
-  return found == fittings_.end() ? nullptr : found->get();
+/// Of the repetitions that have derivatives, whether they have ended or not, that with the least aggregate, of equals
+/// the first; 0 of a single search that has them; empty if none has.
+std::optional<std::size_t> OptimisationTask::fittedRepetition(const RepeatedSearch* all) const {
+  std::optional<std::size_t> best;
+  for (std::size_t i = 0; i < fittings_.size(); ++i) {
+    if (!fittings_[i] || !fittings_[i]->hasDerivatives()) continue;
+    if (!best || (all != nullptr && all->bestAggregate(i) < all->bestAggregate(*best))) best = i;
+  }
+  return best;
 }
 
 /// Each may hold many derivatives.
@@ -355,8 +358,8 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
 
 std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext& context,
                                                                const UnfinishedBatch& made) const {
-  const ResidualFitting* const fitting = fittingWithDerivatives();
-  if (!repeated_ && fitting == nullptr && !(front_ && front_->hasFront())) return std::nullopt;
+  std::optional<std::size_t> fitted = fittedRepetition(nullptr);
+  if (!repeated_ && !fitted && !(front_ && front_->hasFront())) return std::nullopt;
   TaskOutcome outcome{std::string(kEndOfTask)};
   std::optional<FrontFinding> front;
   if (front_) front.emplace(*front_);
@@ -364,17 +367,22 @@ std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext
     RepeatedSearch all = *repeated_;
     all.takeUnfinished(context, made, front ? &front->problem().archive : nullptr);
     all.addResults(context, referencePoint(), outcome);
+    fitted = fittedRepetition(&all);
+    if (fitted) {
+      outcome.report.push_back(
+          fmt::format("The covariance is that of repetition {}, the best of those that have derivatives", *fitted + 1));
+    }
   }
-  if (fitting != nullptr) fitting->addCovariance(context, outcome);
+  if (fitted) fittings_[*fitted]->addCovariance(context, outcome);
   if (front) front->addFront(context, 0, outcome);
   return outcome;
 }
 
-std::optional<int> OptimisationTask::evaluationsInBatches() const {
-  if (repeated_) return repeated_->evaluationCount();
+std::optional<int> OptimisationTask::unfinishedEvaluations(const UnfinishedBatch& made) const {
+  if (repeated_) return repeated_->evaluationCountWith(made);
   if (front_) return front_->evaluationCount();
-  const ResidualFitting* const fitting = fittingWithDerivatives();
-  return fitting == nullptr ? 0 : fitting->problem().evaluationCount;
+  const std::optional<std::size_t> fitted = fittedRepetition(nullptr);
+  return fitted ? fittings_[*fitted]->problem().evaluationCount : 0;
 }
 
 TaskReport OptimisationTask::report() const {

@@ -46,7 +46,7 @@ class OptimisationTask final : public Task {
   }
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
-  std::optional<int> evaluationsInBatches() const override;
+  std::optional<int> unfinishedEvaluations(const UnfinishedBatch& made) const override;
   TaskReport report() const override;
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
   void continueFrom(const std::vector<EarlierSearch>& searches) override { earlierSearches_ = searches; }
@@ -84,7 +84,7 @@ class OptimisationTask final : public Task {
   SearchSummary searchAll(const TaskContext& context);
   void logEnd(const TaskContext& context, const SearchSummary& summary, const std::vector<std::string>& course) const;
   const ResidualFitting* bestFitting() const;
-  const ResidualFitting* fittingWithDerivatives() const;
+  std::optional<std::size_t> fittedRepetition(const RepeatedSearch* all) const;
   void dropFittings();
   void requireResiduals(const TaskReading& reading, const SetupSection& section) const;
   std::span<const double> referencePoint() const;

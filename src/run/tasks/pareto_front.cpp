@@ -158,7 +158,9 @@ DataTable FrontFinding::frontTable(const TaskContext& context) const {
   DataTable table;
   table.file = run_files::kPareto;
   table.headLines = {
-      "Sets that no other set of the search dominates (rank 1), and those of the last population behind them",
+      problem_.population.empty()
+          ? "Sets that no other set of the search dominates (rank 1)"
+          : "Sets that no other set of the search dominates (rank 1), and those of the last population behind them",
       fmt::format(
           "Objective functions: {}, from the seventh column on, as in the table of evaluations. Behind them the "
           "parameters on the model scale",
@@ -195,8 +197,7 @@ DataTable FrontFinding::courseTable() const {
   table.file = run_files::kParetoCourse;
   table.headLines = {
       "The front after so many evaluations: its sets, and its hypervolume as a share of the box between the ideal "
-      "point "
-      "of the last front and the reference point"};
+      "point of the last front and the reference point"};
   table.columns = {"Evaluations", "Front_Size", "Hypervolume"};
   for (const FrontStage& stage : frontCourse(problem_.archive, settings_.referencePoint, kMostStages)) {
     table.rows.push_back(

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <deque>
 #include <limits>
+#include <set>
 #include <utility>
 
 #include <fmt/core.h>
@@ -301,8 +302,13 @@ void RepeatedSearch::addResults(const TaskContext& context, std::span<const doub
   outcome.tables.push_back(repetitionRowTable(stretches_));
 }
 
-int RepeatedSearch::evaluationCount() const {
-  int count = 0;
+int RepeatedSearch::evaluationCountWith(const UnfinishedBatch& made) const {
+  std::set<int> untaken;
+  for (const auto& [number, evaluated] : waiting_) untaken.insert(number);
+  for (const EvaluationResult& result : made.results) {
+    if (result.number <= handedOut_) untaken.insert(result.number);
+  }
+  auto count = static_cast<int>(untaken.size());
   for (const Repetition& repetition : repetitions_) count += repetition.evaluations;
   return count;
 }

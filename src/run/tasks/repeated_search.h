@@ -66,8 +66,10 @@ class RepeatedSearch final {
   /// The index of the best repetition of those that have ended, of equals the first; 0 if none has.
   std::size_t bestEnded() const { return bestEnded_; }
   bool hasEnded(std::size_t index) const;
-  /// Evaluations whose results they have.
-  int evaluationCount() const;
+  /// The best value of one that has begun; NaN if none of its evaluations has succeeded.
+  double bestAggregate(std::size_t index) const { return repetitions_[index].aggregate; }
+  /// Evaluations whose results they have after takeUnfinished().
+  int evaluationCountWith(const UnfinishedBatch& made) const;
 
  private:
   class Watch;

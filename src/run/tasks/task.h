@@ -221,8 +221,9 @@ class Task {
     return std::nullopt;
   }
 
-  /// Of a task whose unfinishedOutcome() is of batches that came to their end alone, how many evaluations these are.
-  virtual std::optional<int> evaluationsInBatches() const { return std::nullopt; }
+  /// Of a task whose unfinishedOutcome() is of other evaluations than the successful ones of `made`, how many these
+  /// are: those of batches that came to their end, say.
+  virtual std::optional<int> unfinishedEvaluations(const UnfinishedBatch& /*made*/) const { return std::nullopt; }
 
   virtual TaskReport report() const { return {}; }
 

@@ -88,6 +88,9 @@ TEST(Dominance, CrowdingIsTheSumOfTheScaledDistancesBetweenNeighbours) {
                                                      DoubleNear(4.0 / 5.0 + 6.0 / 10.0, 1e-15), kInfinite));
   EXPECT_THAT(crowdingDistances(Points{{1.0, 2.0}}), ElementsAre(kInfinite));
   EXPECT_THAT(crowdingDistances(Points{{1.0, 2.0}, {1.0, 2.0}, {1.0, 2.0}}), ElementsAre(0.0, 0.0, 0.0));
+  EXPECT_THAT(crowdingDistances(Points{{-1.5e308, 1.0}, {0.0, 1.0}, {1.5e308, 1.0}}),
+              ElementsAre(kInfinite, 0.0, kInfinite))
+      << "a range beyond all numbers";
   EXPECT_THAT(spreadOver(points, 3), ElementsAre(0, 1, 3));
 }
 

@@ -2,6 +2,7 @@
 
 #include <set>
 
+#include <fmt/ranges.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -89,7 +90,7 @@ TEST(Repetitions, TheirSpreadIsToldInWords) {
 
   const std::string apart = spreadText(repetitionsOf({{0.0, {1.0, 0.0}}, {0.1, {1.0, 0.1}}}));
   EXPECT_THAT(apart,
-              HasSubstr("1 of 2 repetitions ended within 0.005 of the least value, and the worst 0.1 above it. As "
+              HasSubstr("1 of 2 repetitions ended within 5e-07 of the least value, and the worst 0.1 above it. As "
                         "no other came near it"));
   EXPECT_THAT(apart, Not(HasSubstr("poorly")));
 }
@@ -101,9 +102,20 @@ TEST(Repetitions, WhatCountsAsEqualToTheLeastValueHoldsNearZeroAndBelowIt) {
     std::vector<double> starts;
     double tolerance;
     const char* text;
-  } cases[] = {{2.0, {5.0, 9.0, 12.0}, 0.02, "1 % of the least"},       {2.0, {none, none}, 0.02, "1 % of the least"},
-               {0.001, {5.001, 9.0, 1.0}, 0.005, "0.005 of the least"}, {0.0, {4.0, 8.0}, 0.006, "0.006 of the least"},
-               {-12000.0, {-8000.0, none}, 4.0, "4 of the least"},      {-3.0, {-3.0, -3.0}, 0.0, "1 % of the least"}};
+  } cases[] = {{2.0, {5.0, 9.0, 12.0}, 0.02, "1 % of the least"},
+               {2.0, {none, none}, 0.02, "1 % of the least"},
+               // A poor start makes neither 957 and 276 nor 0.27 and 1e-5 equal.
+               {276.0, {9.0e5, 9.0e5}, 2.76, "1 % of the least"},
+               {1.0e-5, {9.0e5 + 1.0e-5, 8.0e6, 1.0}, 0.09, "0.09 of the least"},
+               {0.0, {4.0, 6.0}, 5.0e-7, "5e-07 of the least"},
+               {0.0, {none}, 0.0, "0 of the least"},
+               // -0.899 is as good as -0.9, wherever the search began.
+               {-0.9, {0.1, 0.7}, 0.009, "0.009 of the least"},
+               {-0.9, {9.0e3}, 0.009, "0.009 of the least"},
+               {-0.9, {none}, 0.009, "0.009 of the least"},
+               {-12000.0, {-8000.0, none}, 40.0, "40 of the least"},
+               {-5.0e5, {9.0e5}, 5000.0, "5000 of the least"},
+               {-3.0, {-3.0, -3.0}, 0.0, "0 of the least"}};
   for (const auto& one : cases) {
     const NearlyEqual nearly = nearlyEqual(one.least, one.starts);
     EXPECT_NEAR(nearly.tolerance, one.tolerance, 1e-12);
@@ -119,9 +131,22 @@ TEST(Repetitions, ThatTheyHaveTheirStartInCommonIsNoMinimumThatAllHaveFound) {
                       "began with, which says nothing of a minimum"),
             HasSubstr("Include_Initial_Parameters = 0"), Not(HasSubstr("Whatever the seed"))));
   all[1].start = {1.0, 1.0};
-  EXPECT_THAT(spreadText(all), HasSubstr("better than the sets that it began with"));
+  EXPECT_THAT(spreadText(all), HasSubstr("better than the sets that they began with"));
   all[2].aggregate = 4.99;
   EXPECT_THAT(spreadText(all), HasSubstr("\n2 of 3 repetitions found nothing better than what they began with\n"));
+}
+
+TEST(Repetitions, AnIntegerParameterTakesUpWhatItsRunsHad) {
+  SearchSpace space = repeatedSpace();
+  space.upper[0] = 5.0;  // whole numbers from 0 to 4
+  space.transformation[0] = TransformationType::integer;
+  const auto text = [&space](double a) {
+    return fmt::format(
+        "{}", fmt::join(repetitionLines(repetitionsOf({{2.0, {2.01, 0.0}}, {2.01, {a, 0.1}}}), space, {}, 2), "\n"));
+  };
+  EXPECT_THAT(text(2.99),
+              AllOf(::testing::ContainsRegex("\n   a +2 +2 +2 +0\n"), HasSubstr("within 10 % of its range")));
+  EXPECT_THAT(text(3.0), EndsWith("identifies them poorly: a (25 %)"));
 }
 
 /// Two repetitions with fronts of two objectives, worked out by hand: (0, 1) and (1, 0), and (0.5, 0.5) with a set
@@ -160,6 +185,17 @@ TEST(Repetitions, TheirFrontsAreComparedOnTheScaleOfThatOfAll) {
   EXPECT_EQ(all[1].bestEvaluation, 4);
   EXPECT_EQ(all[1].aggregate, 1.5);
   EXPECT_EQ(all[2].bestEvaluation, 0);
+  // A set of the other repetition with values that are on the front already.
+  std::vector<Repetition> others = all;
+  RepeatedFronts equal = fronts;
+  result.failure.reset();
+  result.number = 6;
+  result.objectiveValues = {1.0, 0.0};
+  addToArchive(equal.problem(1).archive, {2.0, 0.1}, result);
+  addToArchive(ofAll, {2.0, 0.1}, result);
+  equal.describe(ofAll, {}, sum, others);
+  EXPECT_EQ(others[1].front->sharedSize, 2U) << "though the front of all has the first of them alone";
+
   const std::string text = spreadText(all);
   EXPECT_THAT(text, ::testing::ContainsRegex("\n +2 +2 +3 +2 +1 +0.297521 +No. 4  it was enough\n"));
   EXPECT_THAT(text, ::testing::ContainsRegex("\n +3 +3 +3 +0 +0 +none +it was enough\n"));

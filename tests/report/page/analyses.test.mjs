@@ -134,6 +134,23 @@ test('repetitions of a search for a front are compared by its hypervolume', asyn
   });
 });
 
+test('repetitions that have not ended, or have no result, are told of and not compared', async () => {
+  const cut = (data) => {
+    Object.assign(data.repetitions.all[0], { termination: '', aggregate: data.best.aggregate / 2 });
+    Object.assign(data.repetitions.all[2], { best: 0, aggregate: null, ...(data.repetitions.all[2].hypervolume ? { hypervolume: 0 } : {}) });
+    return data;
+  };
+  for (const [data, texts] of [
+    [cut(sample.withTables(2)), ['The best aggregates of 1 repetition', '1 repetition found no value.', '1 repetition had not ended.']],
+    [cut(sample.withTables(4)), ['the fronts of the 1 that has ended with one, on its scale: least 1.5, median 1.5, greatest 1.5', '1 repetition found no front.', '1 repetition had not ended.']]]) {
+    await withReport(data, {}, async (page) => {
+      const words = (await page.locator('#repetitions .findings').innerText()).replace(/[\u2068\u2069]/g, '');
+      for (const text of texts) assert.ok(words.includes(text), words);
+      assert.deepEqual(await blankCharts(page), []);
+    });
+  }
+});
+
 /** A posterior of so many dimensions, those of a short run again and again. */
 function ofDimensions(count) {
   const { posterior } = sample.dataOf('dream');

@@ -14,10 +14,12 @@ const kMostRows = 60; // with a name each
 const kMostLines = 40;
 
 const nameOf = ({ seed, number: of }: Repetition) => `repetition ${of} (seed ${seed})`;
+/** Those that have ended with a best set, or a front: as in the log, the others are told of, but not compared. */
+const compared = (all: readonly Repetition[]) => all.filter(({ best, termination, aggregate, hypervolume }) => best > 0 && termination !== '' && (aggregate !== null || hypervolume != null));
 const least = (all: readonly Repetition[]) => finite(all.map(({ aggregate }) => aggregate)).reduce((a, b) => Math.min(a, b), Infinity);
 
 /** Whether its best value is as good as the least of all. */
-const isNear = ({ tolerance }: Repetitions, one: Repetition, best: number) => one.aggregate !== null && one.aggregate <= best + tolerance;
+const isNear = ({ tolerance }: Repetitions, one: Repetition, best: number) => one.termination !== '' && one.aggregate !== null && one.aggregate <= best + tolerance;
 
 /** Whether a front was searched for, and no best value. */
 const findsFronts = ({ all }: Repetitions) => all.some(({ hypervolume }) => hypervolume !== undefined);
@@ -45,25 +47,33 @@ function listed<Item>(items: readonly Item[], text: (item: Item) => string): str
   return `${items.slice(0, kMostNamed).map(text).join(', ')}${more > 0 ? ` and ${count(more)} more` : ''}`;
 }
 
+function othersThan(ended: readonly Repetition[], all: readonly Repetition[], what: string): Finding[] {
+  const unfinished = all.filter(({ termination }) => termination === '').length;
+  const without = all.length - ended.length - unfinished;
+  return [
+    ...(without > 0 ? [{ kind: 'warning' as const, text: `${counted(without, 'repetition')} found no ${what}.` }] : []),
+    ...(unfinished > 0 ? [{ kind: 'warning' as const, text: `${counted(unfinished, 'repetition')} had not ended.` }] : []),
+  ];
+}
+
 function findings(data: ReportData, repetitions: Repetitions): Finding[] {
-  const { all } = repetitions;
-  const values = sorted(all.map(({ aggregate }) => aggregate));
-  if (values.length === 0) return [{ kind: 'warning', text: 'No repetition has found a value.' }];
+  const ended = compared(repetitions.all);
+  const values = sorted(ended.map(({ aggregate }) => aggregate));
+  const others = othersThan(ended, repetitions.all, 'value');
+  if (values.length === 0) return others;
   const best = values[0]!;
-  const near = all.filter((one) => isNear(repetitions, one, best));
-  const stuck = all.filter(({ aggregate, start }) => aggregate !== null && start !== null && aggregate >= start);
-  const isAgreed = 2 * near.length > all.length;
-  if (all.length > 1 && stuck.length === values.length) {
-    return [{ kind: 'warning', text: `None of ${counted(all.length, 'repetition')} found anything better than what it began with, which says nothing of a minimum: the start may be one, or the search does not get away from it.` }];
+  const near = ended.filter((one) => isNear(repetitions, one, best));
+  const stuck = ended.filter(({ aggregate, start }) => aggregate !== null && start !== null && aggregate >= start);
+  const isAgreed = 2 * near.length > ended.length;
+  if (ended.length > 1 && stuck.length === values.length) {
+    return [{ kind: 'warning', text: `None of ${counted(ended.length, 'repetition')} found anything better than what it began with, which says nothing of a minimum: the start may be one, or the search does not get away from it.` }, ...others];
   }
   const found: Finding[] = [
-    { text: `The best aggregates of ${counted(all.length, 'repetition')}: least ${number(best, 6)}, median ${number(quantile(values, 0.5), 6)}, greatest ${number(values[values.length - 1], 6)}.` },
-    ...(all.length < 2 ? [] : [{ kind: isAgreed ? 'good' as const : 'warning' as const, text: `${count(near.length)} of ${counted(all.length, 'repetition')} ended within ${repetitions.within} value.${
+    { text: `The best aggregates of ${counted(ended.length, 'repetition')}: least ${number(best, 6)}, median ${number(quantile(values, 0.5), 6)}, greatest ${number(values[values.length - 1], 6)}.` },
+    ...(ended.length < 2 ? [] : [{ kind: isAgreed ? 'good' as const : 'warning' as const, text: `${count(near.length)} of ${counted(ended.length, 'repetition')} ended within ${repetitions.within} value.${
       isAgreed ? '' : ' What the search finds depends on the seed: a larger budget helps, or taking the best of several repetitions, as here.'}` }]),
   ];
-  const [without, unfinished] = [all.length - values.length, all.filter(({ termination }) => termination === '').length];
-  if (without > 0) found.push({ kind: 'warning', text: `${counted(without, 'repetition')} found no value.` });
-  if (unfinished > 0) found.push({ kind: 'warning', text: `${counted(unfinished, 'repetition')} had not ended.` });
+  found.push(...others);
   if (stuck.length > 0) found.push({ text: `${counted(stuck.length, 'repetition')} found nothing better than what it began with.` });
   if (near.length < 2) return found;
   const apart = spreads(data, repetitions, near).filter(({ share }) => share > kApart);
@@ -76,18 +86,19 @@ function findings(data: ReportData, repetitions: Repetitions): Finding[] {
 
 /** Of searches for a front: how near each comes to that of all of them. */
 function frontFindings({ front }: ReportData, { all }: Repetitions): Finding[] {
-  const volumes = sorted(all.map(({ hypervolume }) => hypervolume ?? null));
+  const ended = compared(all);
+  const others = othersThan(ended, all, 'front');
+  const volumes = sorted(ended.map(({ hypervolume }) => hypervolume ?? null));
   const greatest = volumes[volumes.length - 1];
-  if (greatest === undefined) return [{ kind: 'warning', text: 'No repetition has found a front.' }];
+  if (greatest === undefined) return others;
   const ofAll = finite(front?.course?.hypervolumes ?? []).at(-1) ?? greatest;
   const near = volumes.filter((volume) => volume >= (1 - kNear) * ofAll).length;
-  const unfinished = all.filter(({ termination }) => termination === '').length;
   return [
-    { text: `The front above is that of all ${counted(all.length, 'repetition')} together. The hypervolumes of their own fronts, on its scale: least ${number(volumes[0], 6)}, median ${number(quantile(volumes, 0.5), 6)}, greatest ${number(greatest, 6)}; that of all ${number(ofAll, 6)}.` },
-    ...(all.length < 2 || !(ofAll > 0) ? [] : [near === all.length
+    { text: `The front above is that of all ${counted(all.length, 'repetition')} together. The hypervolumes of ${ended.length === all.length ? 'their own fronts' : `the fronts of the ${count(ended.length)} that ${ended.length === 1 ? 'has' : 'have'} ended with one`}, on its scale: least ${number(volumes[0], 6)}, median ${number(quantile(volumes, 0.5), 6)}, greatest ${number(greatest, 6)}; that of all ${number(ofAll, 6)}.` },
+    ...(ended.length < 2 || !(ofAll > 0) ? [] : [near === ended.length
       ? { kind: 'good' as const, text: `Whatever the seed, the search found nearly the same front: each hypervolume is within ${percent(kNear)} of that of all.` }
-      : { kind: 'warning' as const, text: `${count(near)} of ${counted(all.length, 'repetition')} come within ${percent(kNear)} of the hypervolume of all: the front that a single search finds depends on the seed. A larger budget helps, or taking the front of several repetitions, as here.` }]),
-    ...(unfinished > 0 ? [{ kind: 'warning' as const, text: `${counted(unfinished, 'repetition')} had not ended.` }] : []),
+      : { kind: 'warning' as const, text: `${count(near)} of ${counted(ended.length, 'repetition')} come within ${percent(kNear)} of the hypervolume of all: the front that a single search finds depends on the seed. A larger budget helps, or taking the front of several repetitions, as here.` }]),
+    ...others,
   ];
 }
 
@@ -151,7 +162,7 @@ function coursePlan(courses: Course[]): ChartPlan {
 }
 
 function volumePlan({ all }: Repetitions): ChartPlan {
-  const order = all.filter(({ hypervolume }) => hypervolume != null).sort((a, b) => b.hypervolume! - a.hypervolume!);
+  const order = all.filter(({ best, hypervolume }) => best > 0 && hypervolume != null).sort((a, b) => b.hypervolume! - a.hypervolume!);
   const isNamed = order.length <= kMostRows;
   return {
     title: 'The hypervolume of each repetition\u2019s front',
@@ -241,7 +252,7 @@ function frontRepetitions(data: ReportData, repetitions: Repetitions): Section {
       table([{ title: 'Repetition' }, { title: 'Seed', number: true }, { title: 'Evaluations', number: true }, { title: 'Hypervolume', number: true },
         { title: 'Compromise', number: true, hint: 'The evaluation' }, { title: 'Why it stopped' }], rows, 'Repetitions'),
       ...(all.length > 1 ? [heading('Spread'), chart(volumePlan(repetitions)),
-        ...(parameters.length > 0 ? [chart(parameterPlan(variableParameters(data), repetitions, least(all)))] : [])] : []),
+        ...(parameters.length > 0 ? [chart(parameterPlan(variableParameters(data), repetitions, least(compared(all))))] : [])] : []),
     ],
   };
 }
@@ -251,7 +262,7 @@ export function repetitionSection(data: ReportData): Section | null {
   if (repetitions && findsFronts(repetitions)) return frontRepetitions(data, repetitions);
   if (!repetitions || repetitions.all.length === 0) return null;
   const { all, parameters } = repetitions;
-  const best = least(all);
+  const best = least(compared(all));
   const courses = coursesOf(data, repetitions);
   const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), number(one.aggregate, 6), count(one.best), one.termination ? count(one.loops) : '', whyItEnded(one)]);
   return {
