@@ -140,8 +140,8 @@ void takeAcceptance(const ChainStates& states, ReportedPosterior& posterior) {
                                                       : kNaN);
     accepted += ofChain;
   }
-  posterior.acceptance =
-      posterior.stateCount > 0 ? static_cast<double>(accepted) / static_cast<double>(posterior.stateCount) : kNaN;
+  const std::size_t proposals = (states.generationCount - posterior.burnIn) * states.chainCount;
+  posterior.acceptance = proposals > 0 ? static_cast<double>(accepted) / static_cast<double>(proposals) : kNaN;
 }
 
 /// How much larger the mean log-likelihood of the last third of the generations behind burn-in is than that of the
@@ -166,9 +166,18 @@ void takeStates(const ChainStates& states, ReportedPosterior& posterior) {
          states.column(kBurnIn)[posterior.burnIn * states.chainCount] == 1.0) {
     ++posterior.burnIn;
   }
-  posterior.stateCount = (states.generationCount - posterior.burnIn) * states.chainCount;
+  const std::vector<double>& likelihoods = states.column(kLogLikelihood);
+  const auto isPossible = [&](std::size_t i) { return likelihoods[i] > -std::numeric_limits<double>::infinity(); };
+  std::vector<std::size_t> counted;  // states of the posterior
+  for (std::size_t i = 0; i < states.generationCount * states.chainCount; ++i) {
+    if (!isPossible(i)) continue;
+    posterior.hasLikelihood = true;
+    if (i >= posterior.burnIn * states.chainCount) counted.push_back(i);
+  }
+  posterior.stateCount = counted.size();
   takeAcceptance(states, posterior);
   posterior.rise = riseOf(states, posterior);
+  if (!posterior.hasLikelihood) return;  // chains that have never moved
   const std::size_t chains = std::min(states.chainCount, kMostChains);
   const std::size_t most =
       std::clamp(kMostTraced / (chains * (posterior.dimensions.size() + 1)), kFewestGenerations, kMostGenerations);
@@ -190,8 +199,7 @@ void takeStates(const ChainStates& states, ReportedPosterior& posterior) {
     const std::vector<double>& values = states.column(kFirstDimension + j);
     posterior.dimensions[j].traces = tracesOf(values);
     for (std::size_t k = 0; k < draws; ++k) {
-      posterior.dimensions[j].draws.push_back(
-          values[posterior.burnIn * states.chainCount + k * posterior.stateCount / draws]);
+      posterior.dimensions[j].draws.push_back(values[counted[k * counted.size() / draws]]);
     }
   }
 }
@@ -309,6 +317,7 @@ std::vector<std::string> adviceOf(const ReportedPosterior& posterior, Convergenc
   if (posterior.isUnfinished) {
     advice.emplace_back("The run was interrupted. Restart = 1 lets the chains go on from here");
   }
+  if (!posterior.hasLikelihood) return advice;
   // The log-likelihood of d dimensions has about the standard deviation sqrt(d / 2) over its posterior.
   const bool isRising = posterior.rise > static_cast<double>(std::max<std::size_t>(posterior.dimensions.size(), 4));
   if (isRising) {
@@ -364,7 +373,7 @@ std::optional<ReportedPosterior> reportedPosterior(const std::string& filePrefix
   }
   takeStates(*states, posterior);
   constexpr std::size_t kLeastGenerations = 4;  // behind burn-in, for a posterior
-  if (posterior.generationCount < posterior.burnIn + kLeastGenerations) return posterior;
+  if (!posterior.hasLikelihood || posterior.generationCount < posterior.burnIn + kLeastGenerations) return posterior;
   const auto damaged = [&](const std::string& file) {
     faults.push_back(fmt::format("{} and {} do not fit together", file, fileNameOf(path)));
   };
@@ -397,6 +406,10 @@ void writePosterior(JsonWriter& json, const ReportedPosterior& posterior) {
     if (words.state != Convergence::apart) {
       json.member("tradeOffs", tradeOffWords(names, posterior.largestCorrelations));
     }
+  }
+  if (!posterior.hasLikelihood) {
+    const std::string text = "There is no posterior: no model run has a likelihood. The log says why, and what helps";
+    json.member("findings", std::vector{text});
   }
   json.member("advice", adviceOf(posterior, words.state));
   json.member("rHatLimit", posterior.limits.rHat).member("effectiveLimit", posterior.limits.effectiveSize);

@@ -41,7 +41,7 @@ struct ReportedPosterior {
   std::size_t chainCount = 0;
   std::size_t generationCount = 0;
   std::size_t burnIn = 0;      ///< generations
-  std::size_t stateCount = 0;  ///< behind burn-in
+  std::size_t stateCount = 0;  ///< behind burn-in, with a likelihood
   double acceptance = 0.0;     ///< share of the proposals behind burn-in; NaN without any
   std::vector<double> chainAcceptance;
   double rise = 0.0;                ///< of the mean log-likelihood behind burn-in; NaN if it is not known
@@ -50,8 +50,9 @@ struct ReportedPosterior {
   std::vector<double> checkedRuns;                ///< model runs at which the chains were compared
   std::vector<std::vector<double>> correlations;  ///< of all dimensions; empty if they are not known
   std::vector<PairCorrelation> largestCorrelations;
-  bool isUnfinished = false;  ///< the run was interrupted
-  bool hasPosterior = false;  ///< else the run ended in burn-in, or its table cannot be read
+  bool isUnfinished = false;   ///< the run was interrupted
+  bool hasLikelihood = false;  ///< one of the states
+  bool hasPosterior = false;   ///< else the run ended in burn-in, or its table cannot be read
 };
 
 /// What Markov chains have written beside their results; empty if there are no chains. Each file that cannot be read is

@@ -60,6 +60,7 @@ class SetupCheck final {
   RunLog log_;  ///< never opened: of it the warnings alone are needed
   RunConfig config_;
   int warningCount_ = 0;
+  std::string fault_;  ///< of a setup that is accepted, but whose run cannot come to its end
   int exitCode_ = 0;
   bool isRun_ = true;  ///< the model; false: its parameter set cannot be
 };
@@ -74,6 +75,7 @@ void SetupCheck::run(const std::string& setupFileName) {
   if (config_.task) print(fmt::format("Planned model runs: {}", config_.plannedModelRuns()));
   runModel();
   if (exitCode_ != 0) return;
+  if (!fault_.empty()) fatalError("Error: The run would end before it is complete", fault_);
   print(fmt::format("Nothing is wrong{}; no file of a run was made or changed",
                     warningCount_ == 0 ? std::string()
                                        : ", but for " + countText(static_cast<std::size_t>(warningCount_), "warning")));
@@ -84,8 +86,9 @@ void SetupCheck::runModel() {
   ObjectiveAggregator aggregator(config_.objectives, config_.aggregationMethod);
   if (config_.task) {
     config_.task->requireSets(parameters.searchSpace(), parameters.feasibility());
-    for (const std::string& text : config_.task->setDoubts(parameters.searchSpace(), parameters.feasibility())) {
-      log_.warning(text);
+    for (const SetDoubt& doubt : config_.task->setDoubts(parameters.searchSpace(), parameters.feasibility())) {
+      log_.warning(doubt.text);
+      if (doubt.endsRun) fault_ = doubt.text;
     }
   }
   PosixProcessLauncher launcher;

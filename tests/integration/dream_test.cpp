@@ -179,8 +179,40 @@ TEST(Dream, AnObjectiveFunctionMayBeTheLikelihoodAndFailedRunsHaveNone) {
     EXPECT_NEAR(-logLikelihood, realCell(results.rows[number - 1][*results.column("flow")]).value(), 1e-5);
     EXPECT_LE(realCell(row[*table.column("a")]).value(), 9.9);
   }
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("had no likelihood: their sets have likelihood 0 and were rejected"));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr(" without a likelihood, whose sets were rejected: "));
   EXPECT_FALSE(folder.exists("basin_TotalBand_1.csv"));
+}
+
+TEST(Dream, OfRunsWithoutALikelihoodHasNoPosteriorAndSaysWhy) {
+  const struct {
+    const char* dream;
+    const char* rows;  ///< of the simulated file from the second on
+    const char* reason;
+  } cases[] = {
+      {"Box_Cox_Lambda = 0.0", "2001-01-02 00:00,0", "have simulated values without a Box-Cox transformation"},
+      {"Box_Cox_Lambda = 0.5", "2001-01-02 00:00,-1", "have simulated values without a Box-Cox transformation"},
+      {"Error_Deviation = 1e-300", "2001-01-02 00:00,4", "have no finite errors, or errors too large"},
+      {"Error_Bias = 1e308", "2001-01-02 00:00,4", "have no finite errors, or errors too large"},
+  };
+  for (const auto& [dream, rows, reason] : cases) {
+    SCOPED_TRACE(dream);
+    const ModelFolder folder;
+    const std::string setup =
+        writeDream(folder, {.maxEvaluations = 60}, fmt::format("Likelihood = 'normal'\n {}", dream));
+    folder.useScript(fmt::format("printf 'time,simulated\\n2001-01-01 00:00,3\\n{}\\n' > simulated.csv; exit 0", rows));
+    const ProgramResult run = runProgram({setup});
+    EXPECT_EQ(run.exitCode, 0);
+    EXPECT_THAT(run.error, AllOf(HasSubstr("No posterior: none of the "), HasSubstr(reason)));
+    const std::string log = folder.read("basin.log");
+    EXPECT_THAT(log,
+                AllOf(HasSubstr("Warning: No posterior: none of the "), HasSubstr(reason), Not(HasSubstr("R-hat i"))));
+    EXPECT_EQ(log.find("No posterior"), log.rfind("No posterior")) << "told once";
+    EXPECT_TRUE(folder.exists("basin_Chains.dat"));
+    for (const char* const file : {"basin_Posterior.dat", "basin_Convergence.dat", "basin_Marginals.dat",
+                                   "basin_SampleCorrelation.dat", "basin_Band_1.csv", "basin_TotalBand_1.csv"}) {
+      EXPECT_FALSE(folder.exists(file)) << file;
+    }
+  }
 }
 
 TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
@@ -206,6 +238,9 @@ TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
       {"Likelihood = 'normal'\n [ERROR_MODEL_2]\n Likelihood = 'Student'\n [/ERROR_MODEL_2]",
        "ERROR_MODEL_2: expected the number of an output measure"},
       {"Likelihood = 'Box-Cox'\n Box_Cox_Shift = -6.0", "expected a Box_Cox_Shift with which all observations", false},
+      {"Likelihood = 'Student'\n Student_Freedom = 1000001.0", "expected 0.5 to 1000000, found 1000001"},
+      {"Likelihood = 'normal'\n Box_Cox_Lambda = 0.0\n Box_Cox_Shift = 1e300",
+       "do not vary after the Box-Cox transformation", false},
       {"Likelihood = 'normal'\n Effective_Size = 161.0", "expected at most 160, the part of Sample_Size"},
       // What no error model depends on would have its prior for a posterior.
       {"Likelihood = 'normal'\n Student_Freedom = 2.0, 50.0", "expected 'Student', or no Student_Freedom"},
@@ -258,6 +293,15 @@ TEST(Dream, PriorsThatHaveNothingWithinTheBoundsAreRefusedAndOthersAreCutThere) 
   EXPECT_NEAR(dreamCell(posterior, "a", "Prior 95 %"), 9.5, 0.1);
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("PARAMETER_1: a, mean 5, standard deviation 100"));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("% of the values drawn are outside"));
+
+  // Single values are refused where they are written.
+  const std::string uniform = withPrior("5.0", "1.0");
+  folder.editSetup(" Mean_Value = 5.0\n Standard_Deviation = 1.0", "Distribution = 'discrete'\nValues = 1.0, 2.0");
+  const ProgramResult single = runProgram({"--check", uniform});
+  EXPECT_THAT(single.error, HasSubstr("Distribution: the distribution of a has single values"));
+  const std::string setupText = folder.read("basin.kdx");
+  const auto line = 1 + std::ranges::count(setupText.substr(0, setupText.find("Distribution = ")), '\n');
+  EXPECT_THAT(single.error, HasSubstr(fmt::format("basin.kdx:{}:", line)));
 
   // On a range that does not begin at 0, numbers are too coarse for a peak without end.
   const struct {
@@ -369,7 +413,8 @@ TEST(Dream, ARunThatFailsTooOftenTellsWhatHelpsAndGoesOnWithALargerLimit) {
   settings.maxEvaluations = 120;
   const ProgramResult more = runProgram({writeDream(folder, settings, dream)});
   EXPECT_EQ(more.exitCode, 0) << more.error;
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("9 model runs failed or had no likelihood"));
+  EXPECT_THAT(folder.read("basin.log"),
+              HasSubstr("9 model runs without a likelihood, whose sets were rejected: 9 failed\n"));
 }
 
 }  // namespace

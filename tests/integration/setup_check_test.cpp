@@ -145,7 +145,9 @@ TEST(SetupCheck, RunsASetOfTheTaskWhereInitialValuesThatItDoesWithoutCannotBeRun
       "   a = 4\n   b = 1\n   c = 1 (fixed)\nThey cannot be run, and this task does without";
   const Case cases[] = {
       {1, "Sensitivity_Type = 0", "Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 32\n[/SOBOL]",
-       " of 128 sets of the design are not run and fail"},
+       " of 128 sets of the design are not run and fail", "Error: The run would end before it is complete\n"},
+      {1, "Sensitivity_Type = 0", "Sensitivity_Type = 'Morris'\n[MORRIS]\nDesign = 'trajectories'\n[/MORRIS]",
+       " points of the trajectories cannot be run and are left out"},
       {1, "Sensitivity_Type = 0", "Sensitivity_Type = 'Morris'", kInstead},
       {3, "", "", kInstead},
       {3, "Uncertainty_Type = 1", "Uncertainty_Type = 1\nRedraw_Infeasible = 1", kInstead},
@@ -172,6 +174,7 @@ TEST(SetupCheck, RunsASetOfTheTaskWhereInitialValuesThatItDoesWithoutCannotBeRun
     if (!isFault) {
       EXPECT_THAT(result.output, HasSubstr("Aggregate: "));
     }
+    EXPECT_EQ(result.output.find("Nothing is wrong") != std::string::npos, !isFault);
     EXPECT_THAT(result.error, AllOf(HasSubstr(each.error), Not(HasSubstr("was run"))));
     EXPECT_FALSE(folder.exists("basin_Check_Process1"));
     EXPECT_TRUE(stateOf(folder) == before);

@@ -234,6 +234,10 @@ TEST(SobolRun, SaysHowItsDistributionsAndConstraintsFitToTheBounds) {
                    "TqSEKdxListItemCount = 1\n[CONSTRAINT_1]\nLeft_Equation = 'a'\nRight_Equation = '5'\n"
                    "Logical_Operator = 1\n[/CONSTRAINT_1]\n[/INTERNAL_CONSTRAINTS]");
   const ProgramResult check = runProgram({"--check", setup});
+  EXPECT_EQ(check.exitCode, 1);
+  EXPECT_THAT(check.error,
+              AllOf(HasSubstr("The run would end before it is complete"), HasSubstr("sets of the design")));
+  EXPECT_THAT(check.output, Not(HasSubstr("Nothing is wrong")));
   EXPECT_THAT(check.output, AllOf(HasSubstr("sets of the design are not run"),
                                   HasSubstr("The run will end before it is complete"), HasSubstr("Narrower bounds")));
 }

@@ -24,7 +24,8 @@ constexpr double kPriorWidth = 20.0;
 /// Chains of two dimensions with hostile names: x normal around 3, y = 2 x with noise, on a prior of width 20.
 class PosteriorFiles {
  public:
-  explicit PosteriorFiles(int mostRuns, double burnInShare = 0.2, std::size_t matrixLimit = 1000) {
+  explicit PosteriorFiles(int mostRuns, double burnInShare = 0.2, std::size_t matrixLimit = 1000,
+                          bool isPossible = true) {
     settings.mostRuns = mostRuns;
     settings.burnInShare = burnInShare;
     DreamProblem problem;
@@ -36,12 +37,13 @@ class PosteriorFiles {
     };
     problem.logPrior = [](std::span<const double>) { return -2.0 * std::log(kPriorWidth); };
     int runs = 0;
-    problem.evaluate = [runs](std::span<const DreamProposal> proposals) mutable {
+    problem.evaluate = [runs, isPossible](std::span<const DreamProposal> proposals) mutable {
       std::vector<ProposalResult> results;
       for (const DreamProposal& one : proposals) {
         const double x = one.point[0] - 3.0;
         const double y = one.point[1] - 2.0 * one.point[0];
-        results.push_back({-0.5 * x * x - 0.5 * y * y / 0.04, ++runs});
+        const double density = -0.5 * x * x - 0.5 * y * y / 0.04;
+        results.push_back({isPossible ? density : -std::numeric_limits<double>::infinity(), ++runs});
       }
       return results;
     };
@@ -199,6 +201,24 @@ TEST(ReportedPosterior, OfARunThatEndedInBurnInHasTheChainsAlone) {
   json.beginObject();
   writePosterior(json, *found);
   EXPECT_THAT(json.endObject().take(), ::testing::Not(HasSubstr("\"state\"")));
+}
+
+TEST(ReportedPosterior, OfChainsWithoutALikelihoodShowsNothingOfTheirStates) {
+  PosteriorFiles files(400, 0.2, 1000, false);
+  const auto found = files.reported();
+  ASSERT_TRUE(found);
+  EXPECT_THAT(files.faults, IsEmpty()) << "the tables that are not there are none that are missing";
+  EXPECT_EQ(found->stateCount, 0U);
+  for (const ReportedDimension& one : found->dimensions) {
+    EXPECT_THAT(one.draws, IsEmpty());
+    EXPECT_THAT(one.traces, IsEmpty());
+  }
+  JsonWriter json;
+  json.beginObject();
+  writePosterior(json, *found);
+  const std::string text = json.endObject().take();
+  EXPECT_THAT(text, HasSubstr("\"findings\":[\"There is no posterior: no model run has a likelihood"));
+  EXPECT_THAT(text, HasSubstr("\"advice\":[]"));
 }
 
 }  // namespace

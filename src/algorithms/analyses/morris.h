@@ -57,6 +57,9 @@ std::vector<std::string> formatMorris(const MorrisOutcome& outcome, const Effect
                                       const MorrisSettings& settings, const AnalysisNames& names,
                                       std::string_view file);
 
+/// Which points and effects the analysis has to do without, as sets cannot be run; empty: none.
+std::string infeasiblePointsText(const EffectPlan& plan, std::span<const std::string> parameters);
+
 /// The name of a verdict in the table: "fix", "keep", "undecided"; empty for none.
 std::string_view verdictName(ScreeningVerdict verdict);
 

@@ -217,6 +217,24 @@ void appendLosses(const MorrisOutcome& outcome, const EffectPlan& plan, std::vec
 
 }  // namespace
 
+std::string infeasiblePointsText(const EffectPlan& plan, std::span<const std::string> parameters) {
+  ShortList lacking(kMostNamed);
+  const std::size_t count = plan.trajectories.size();
+  for (std::size_t j = 0; j < parameters.size(); ++j) {
+    if (plan.infeasible[j] > 0) lacking.add(fmt::format("{} ({} of {})", parameters[j], plan.infeasible[j], count));
+  }
+  if (plan.infeasiblePoints == 0 && lacking.isEmpty()) return {};
+  std::string text =
+      fmt::format("{} of {} points of the trajectories cannot be run and {} left out, with the effects of their steps",
+                  plan.infeasiblePoints, count * (parameters.size() + 1), plan.infeasiblePoints == 1 ? "is" : "are");
+  if (!plan.violation.empty()) text += fmt::format("; the first: {}", plan.violation);
+  if (!lacking.isEmpty()) text += "\n   Parameters that lack effects, in how many trajectories: " + lacking.text();
+  if (plan.design == EffectDesign::trajectories) {
+    text += "\n   Design = 'radial' takes other points instead, as far as it finds some that can be run";
+  }
+  return text;
+}
+
 std::vector<std::string> formatMorris(const MorrisOutcome& outcome, const EffectPlan& plan,
                                       const MorrisSettings& settings, const AnalysisNames& names,
                                       std::string_view file) {

@@ -116,11 +116,21 @@ BandCoverage coverageOf(const SeriesBand& band, const ObservedSeries& ofBand, co
   return coverage.found();
 }
 
+namespace {
+
+/// With two decimals, unless it is far too large for them to matter.
+std::string relativeText(double width) {
+  constexpr double kLarge = 1000.0;
+  return width < kLarge ? fmt::format("{:.2f}", width) : fmt::format("{:.3g}", width);
+}
+
+}  // namespace
+
 std::string bandWidthText(const BandCoverage& coverage) {
   if (coverage.observationCount == 0) return "";
   std::string text = fmt::format("a mean width of {:.4g} at the observations", coverage.meanWidth);
   if (std::isfinite(coverage.relativeWidth)) {
-    text += fmt::format(", {:.2f} of their standard deviation", coverage.relativeWidth);
+    text += fmt::format(", {} of their standard deviation", relativeText(coverage.relativeWidth));
   }
   return text;
 }

@@ -206,6 +206,10 @@ double SeriesErrors::restored(double value, double lambda) const {
   return std::pow(base, 1.0 / lambda) - shift_;
 }
 
+double SeriesErrors::biased(double simulated, const ErrorValues& values) {
+  return values[kBias] == 0.0 ? simulated : simulated * std::exp(values[kBias] * simulated);
+}
+
 double SeriesErrors::logLikelihood(std::span<const double> simulated, const ErrorValues& values) const {
   const ErrorShape shape(form_, values);
   const double lambda = values[kLambda];
@@ -214,8 +218,7 @@ double SeriesErrors::logLikelihood(std::span<const double> simulated, const Erro
   double before = 0.0;
   for (std::size_t k = 0; k < counted_.size(); ++k) {
     const std::size_t t = counted_[k];
-    double level = simulated[t];
-    if (values[kBias] != 0.0) level *= std::exp(values[kBias] * level);
+    const double level = biased(simulated[t], values);
     const double error = transformed(observed_[t], lambda) - transformed(level, lambda);
     if (!std::isfinite(error)) return -kInfinity;
     Step step{0.0, 1.0 / std::sqrt(1.0 - correlation * correlation)};  // of the first
@@ -231,14 +234,24 @@ double SeriesErrors::logLikelihood(std::span<const double> simulated, const Erro
   return std::isnan(sum) ? -kInfinity : sum;
 }
 
+LikelihoodLack SeriesErrors::lackIn(std::span<const double> simulated, const ErrorValues& values) const {
+  if (logLikelihood(simulated, values) > -kInfinity) return LikelihoodLack::none;
+  const auto isMissing = [&](std::size_t t) { return !std::isfinite(simulated[t]); };
+  const auto isUntransformed = [&](std::size_t t) {
+    const double level = biased(simulated[t], values);
+    return std::isfinite(level) && !std::isfinite(transformed(level, values[kLambda]));
+  };
+  if (std::ranges::any_of(counted_, isMissing)) return LikelihoodLack::missing;
+  return std::ranges::any_of(counted_, isUntransformed) ? LikelihoodLack::untransformed : LikelihoodLack::notFinite;
+}
+
 SeriesErrors::Path::Path(const SeriesErrors& errors, const ErrorValues& values)
     : errors_(&errors), values_(values), shape_(errors.form_, values) {}
 
 double SeriesErrors::Path::next(std::size_t time, double simulated, ChainRandom& random) {
   const double innovation = shape_.draw(random);
   if (!std::isfinite(simulated)) return kNaN;
-  double level = simulated;
-  if (values_[kBias] != 0.0) level *= std::exp(values_[kBias] * level);
+  const double level = biased(simulated, values_);
   const double correlation = values_[kCorrelation];
   Step step{0.0, 1.0 / std::sqrt(1.0 - correlation * correlation)};
   if (!std::isnan(before_)) step = errors_->stepOver(errors_->days_[time] - errors_->days_[timeBefore_], correlation);

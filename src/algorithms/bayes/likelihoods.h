@@ -67,6 +67,14 @@ bool readsTerm(LikelihoodForm form, ErrorTerm term);
 using ErrorValues = std::array<double, kErrorTermCount>;
 ErrorValues neutralErrors();
 
+/// Why a series has no likelihood; none where it has one.
+enum class LikelihoodLack {
+  none,
+  missing,        ///< an observation that counts has no simulated value
+  untransformed,  ///< a simulated value has no finite transformation
+  notFinite,      ///< errors, or their deviations, are beyond the range of numbers
+};
+
 /// The standardised innovations a_t: normal, Student's t (scale 1, whose standard deviation is larger), or the skew
 /// exponential power distribution SEP(0, 1, xi, beta) of Schoups and Vrugt (2010, doi:10.1029/2009WR008933).
 class ErrorShape final {
@@ -111,6 +119,9 @@ class SeriesErrors final {
   /// transformed value.
   double logLikelihood(std::span<const double> simulated, const ErrorValues& values) const;
 
+  /// Why logLikelihood() is -infinity: the first of these reasons that one of the values gives.
+  LikelihoodLack lackIn(std::span<const double> simulated, const ErrorValues& values) const;
+
   /// Turns simulated values into draws of what would be observed, time after time.
   class Path {
    public:
@@ -141,6 +152,7 @@ class SeriesErrors final {
   };
   Step stepOver(double days, double correlation) const;
   double transformed(double value, double lambda) const;
+  static double biased(double simulated, const ErrorValues& values);
   double restored(double value, double lambda) const;
 
   LikelihoodForm form_;

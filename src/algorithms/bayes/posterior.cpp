@@ -21,12 +21,20 @@ namespace {
 constexpr std::size_t kBins = 40;
 constexpr std::size_t kMostListed = 50;  // dimensions in the table of the log
 
-/// Calls `take(state)` for each state behind burn-in.
+bool hasLikelihood(const ChainHistory::State& state) {
+  return state.logLikelihood > -std::numeric_limits<double>::infinity();
+}
+
+/// Calls `take(state)` for each state behind burn-in. Those without a likelihood, of chains that have not come out of
+/// where they began, are no part of the posterior.
 template <class Take>
 void forPosterior(const DreamSampler& sampler, const Take& take) {
   const ChainHistory& history = sampler.history();
   for (std::size_t g = sampler.burnIn().value_or(history.generations()); g < history.generations(); ++g) {
-    for (std::size_t c = 0; c < history.chainCount(); ++c) take(history.at(g, c));
+    for (std::size_t c = 0; c < history.chainCount(); ++c) {
+      const ChainHistory::State state = history.at(g, c);
+      if (hasLikelihood(state)) take(state);
+    }
   }
 }
 
@@ -64,6 +72,42 @@ std::string endText(const DreamSettings& settings, DreamEnd end) {
       break;
   }
   return "The chains were interrupted";
+}
+
+/// "90 failed, and 3 have ..."
+std::string reasonsText(const RunsWithoutLikelihood& runs) {
+  const std::pair<int, const char*> all[] = {
+      {runs.failed, "failed"},
+      {runs.missing, "lack simulated values where observations count"},
+      {runs.untransformed,
+       "have simulated values without a Box-Cox transformation, zeros with a lambda of at most 0 or values below the "
+       "negative Box_Cox_Shift"},
+      {runs.notFinite, "have no finite errors, or errors too large for their deviation"},
+      {runs.notNumbers, "have no finite value of the objective function"},
+  };
+  std::vector<std::string> parts;
+  for (const auto& [count, text] : all) {
+    if (count > 0) parts.push_back(fmt::format("{} {}", count, text));
+  }
+  return fmt::format("{}", fmt::join(parts, "; "));
+}
+
+std::string remedyText(const RunsWithoutLikelihood& runs) {
+  std::string text;
+  if (runs.failed > 0) text += " Keep the chains away from where the model fails: narrower bounds, or another prior.";
+  if (runs.missing > 0) text += " Simulated values are needed at the times of all observations that count.";
+  if (runs.untransformed > 0) {
+    text +=
+        " Zeros have a transformation with bounds of Box_Cox_Lambda above 0; a larger Box_Cox_Shift is for them "
+        "and for values below it.";
+  }
+  if (runs.notFinite > 0) {
+    text +=
+        " Error_Deviation, Error_Share and Error_Bias must fit the size of the errors; without them the bounds of "
+        "the deviation come from the observations.";
+  }
+  if (runs.notNumbers > 0) text += " The objective function has to be a finite number.";
+  return text;
 }
 
 std::vector<DimensionFigures> figuresOf(const ShownDimensions& dimensions, const PosteriorSummary& summary) {
@@ -105,7 +149,9 @@ std::vector<std::size_t> mostNarrowed(std::span<const DimensionFigures> figures)
   std::vector<std::size_t> order(figures.size());
   std::iota(order.begin(), order.end(), std::size_t{0});
   if (order.size() <= kMostListed) return order;
-  const auto key = [&](std::size_t j) { return std::isnan(figures[j].narrowing) ? std::numeric_limits<double>::infinity() : figures[j].narrowing; };
+  const auto key = [&](std::size_t j) {
+    return std::isnan(figures[j].narrowing) ? std::numeric_limits<double>::infinity() : figures[j].narrowing;
+  };
   std::ranges::stable_sort(order, std::less(), key);
   order.resize(kMostListed);
   std::ranges::sort(order);
@@ -182,7 +228,10 @@ std::optional<PosteriorSummary> summarisePosterior(const DreamSampler& sampler, 
     summary.mostProbable = rows.back();
     summary.mostProbableRun = state.evaluation;
   });
+  if (rows.empty()) return std::nullopt;
   summary.draws = rows.size();
+  const ChainHistory& history = sampler.history();
+  summary.withoutLikelihood = (history.generations() - *sampler.burnIn()) * history.chainCount() - rows.size();
   const std::vector<std::vector<double>> prior = shownColumns(dimensions, priorDraws);
   for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
     std::vector<double> values;
@@ -319,17 +368,32 @@ DataTable convergenceTable(const DreamSampler& sampler, const ShownDimensions& d
   return table;
 }
 
+std::string noLikelihoodText(const DreamSampler& sampler, const RunsWithoutLikelihood& runs) {
+  const ChainHistory& history = sampler.history();
+  // A chain never goes back to where there is no likelihood.
+  for (std::size_t c = 0; c < history.chainCount() && history.generations() > 0; ++c) {
+    if (hasLikelihood(history.at(history.generations() - 1, c))) return {};
+  }
+  return fmt::format("No posterior: none of the {} has a likelihood: {}.{}",
+                     countText(static_cast<std::size_t>(sampler.runs()), "model run"), reasonsText(runs),
+                     remedyText(runs));
+}
+
 std::vector<std::string> formatPosterior(const DreamSettings& settings, const DreamSampler& sampler,
                                          const ShownDimensions& dimensions, const PosteriorSummary* summary,
-                                         int failures, const PosteriorFiles& files) {
+                                         const RunsWithoutLikelihood& runs, const PosteriorFiles& files) {
   const ChainHistory& history = sampler.history();
   std::vector<std::string> lines{fmt::format("DREAM(ZS): {} chains, {} generations, {}", history.chainCount(),
                                              history.generations(),
                                              countText(static_cast<std::size_t>(sampler.runs()), "model run"))};
   lines.push_back(endText(settings, sampler.end()));
-  if (failures > 0) {
-    lines.push_back(fmt::format("{} failed or had no likelihood: their sets have likelihood 0 and were rejected",
-                                countText(static_cast<std::size_t>(failures), "model run")));
+  if (const std::string text = noLikelihoodText(sampler, runs); !text.empty()) {
+    lines.push_back("Warning: " + text);
+    return lines;
+  }
+  if (runs.count() > 0) {
+    lines.push_back(fmt::format("{} without a likelihood, whose sets were rejected: {}",
+                                countText(static_cast<std::size_t>(runs.count()), "model run"), reasonsText(runs)));
   }
   if (summary == nullptr) {
     lines.emplace_back(sampler.burnIn() ? "Warning: No posterior: there are fewer than 4 generations behind burn-in"
@@ -341,6 +405,14 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
                   "posterior is {} states behind it",
                   *sampler.burnIn(), settings.burnInShare,
                   settings.burnInOf > 0 ? settings.burnInOf : settings.mostRuns, summary->draws));
+  if (summary->withoutLikelihood > 0) {
+    lines.push_back(
+        fmt::format("Warning: {} more behind burn-in {} no likelihood and {} left out: chains have not "
+                    "found a set that has one, or late. Narrower bounds or another prior help, or a larger "
+                    "Burn_In_Share",
+                    countText(summary->withoutLikelihood, "state"), summary->withoutLikelihood == 1 ? "has" : "have",
+                    summary->withoutLikelihood == 1 ? "is" : "are"));
+  }
   const std::vector<DimensionFigures> figures = figuresOf(dimensions, *summary);
   appendConvergence(settings, figures, lines);
   appendCounts(sampler, lines);

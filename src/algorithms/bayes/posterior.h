@@ -36,11 +36,12 @@ struct PosteriorSummary {
   std::vector<PairCorrelation> largestCorrelations;
   std::vector<double> mostProbable;  ///< the state of the largest posterior density
   int mostProbableRun = 0;
-  std::size_t draws = 0;  ///< states behind burn-in
+  std::size_t draws = 0;              ///< states behind burn-in
+  std::size_t withoutLikelihood = 0;  ///< further ones, which are left out
 };
 
 /// `priorDraws`: points of the chains' scale. Of more dimensions than `matrixLimit` only the largest correlations are
-/// kept. Empty while there are fewer than 4 generations behind burn-in.
+/// kept. Empty while there are fewer than 4 generations behind burn-in, and where no state there has a likelihood.
 std::optional<PosteriorSummary> summarisePosterior(const DreamSampler& sampler, const ShownDimensions& dimensions,
                                                    std::span<const std::vector<double>> priorDraws,
                                                    std::size_t matrixLimit);
@@ -62,9 +63,23 @@ struct PosteriorFiles {
   std::string correlations;
 };
 
-/// The same in words, for the log, with at most 50 dimensions in a table. `failures`: proposals whose model run failed.
+/// Model runs whose sets have no likelihood, by the reason.
+struct RunsWithoutLikelihood {
+  int failed = 0;
+  int missing = 0;  ///< LikelihoodLack, likewise the next two
+  int untransformed = 0;
+  int notFinite = 0;
+  int notNumbers = 0;  ///< the objective function that is the likelihood is not finite
+
+  int count() const { return failed + missing + untransformed + notFinite + notNumbers; }
+};
+
+/// The same in words, for the log, with at most 50 dimensions in a table.
 std::vector<std::string> formatPosterior(const DreamSettings& settings, const DreamSampler& sampler,
                                          const ShownDimensions& dimensions, const PosteriorSummary* summary,
-                                         int failures, const PosteriorFiles& files);
+                                         const RunsWithoutLikelihood& runs, const PosteriorFiles& files);
+
+/// Says why there is no posterior though chains have states: no model run has a likelihood. Empty if one has.
+std::string noLikelihoodText(const DreamSampler& sampler, const RunsWithoutLikelihood& runs);
 
 }  // namespace mirevo

@@ -35,6 +35,13 @@ std::string listed(std::span<const std::pair<std::string, std::string>> named) {
   return list.text();
 }
 
+/// Chains that do not move have one that is not finite or as large as rounding makes it.
+std::string rHatText(double rHat) {
+  constexpr double kLarge = 1000.0;
+  if (std::isnan(rHat)) return "not known";
+  return rHat > kLarge ? fmt::format("over {:g}", kLarge) : fmt::format("{:.3g}", rHat);
+}
+
 /// Of the dimensions that `isMeant` holds for, those with the largest `badness` first; not a number is the worst.
 template <class IsMeant, class Badness>
 std::vector<const DimensionFigures*> worstFirst(std::span<const DimensionFigures> dimensions, const IsMeant& isMeant,
@@ -81,7 +88,7 @@ ConvergenceWords convergenceWords(std::span<const DimensionFigures> dimensions, 
   for (const DimensionFigures* one : worstFirst(
            dimensions, [&](const DimensionFigures& of) { return isApart(of, limits); },
            [](const DimensionFigures& of) { return of.rHat; })) {
-    apart.emplace_back(one->name, fmt::format("{:.3g}", one->rHat));
+    apart.emplace_back(one->name, rHatText(one->rHat));
   }
   for (const DimensionFigures* one : worstFirst(
            dimensions, [&](const DimensionFigures& of) { return hasFewDraws(of, limits); },

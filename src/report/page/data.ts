@@ -236,7 +236,7 @@ export interface PosteriorDimension {
 /** What Markov chains have found. Traces and draws are thinned, figures are of all states. */
 export interface Posterior {
   state?: 'reached' | 'fewDraws' | 'apart'; // absent where there is no posterior
-  findings?: string[]; // on convergence
+  findings?: string[]; // on convergence; where no state has a likelihood, that
   tradeOffs?: string[];
   advice: string[];
   rHatLimit: number;
@@ -244,7 +244,7 @@ export interface Posterior {
   chains: number;
   generationCount: number;
   burnIn: number; // generations
-  states: number; // behind burn-in
+  states: number; // behind burn-in, with a likelihood
   acceptance: Maybe;
   chainAcceptance: Maybe[];
   dimensions: PosteriorDimension[];

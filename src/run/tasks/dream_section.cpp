@@ -229,10 +229,11 @@ void checkTerms(const SetupSection& section, const ErrorModelSettings& settings)
     const bool isFixedAtZero = k == kDeviation && numbers == std::vector<double>{0.0};
     const ValueRange range{row.least, row.most, isFixedAtZero};
     for (const double number : numbers) {
-      if (!range.contains(number)) refuse(fmt::format("expected {}, found {:g}", range.text(), number));
+      if (!range.contains(number)) refuse(fmt::format("expected {}, found {}", range.text(), formatReal(number)));
     }
     if (numbers.size() == 2 && !(numbers[0] < numbers[1])) {
-      refuse(fmt::format("expected a lower bound below the upper one, found {:g} and {:g}", numbers[0], numbers[1]));
+      refuse(fmt::format("expected a lower bound below the upper one, found {} and {}", formatReal(numbers[0]),
+                         formatReal(numbers[1])));
     }
   }
 }

@@ -72,7 +72,8 @@ void DreamTarget::addTerms(const DreamSection& settings, const ErrorModelSetting
   const ErrorModelSettings& common = settings.errors;
   const std::string& measure = series.name;
   const std::vector<double> lambda = numbersOf(kLambda, common, own, form);
-  if (lambda != std::vector<double>{1.0}) {
+  const bool isTransformed = lambda != std::vector<double>{1.0};
+  if (isTransformed) {
     if (const auto value = series.errors.untransformable()) {
       fatalError(kDreamLikelihoodRefusal,
                  fmt::format("{}: the observation {:g} of {} has no Box-Cox transformation: expected a Box_Cox_Shift "
@@ -90,8 +91,10 @@ void DreamTarget::addTerms(const DreamSection& settings, const ErrorModelSetting
       numbers = {kLeastDeviation * std::min(one, other), kMostDeviation * std::max(one, other)};
       if (!(numbers.front() > 0.0)) {
         fatalError(kDreamLikelihoodRefusal,
-                   fmt::format("{}: the observations of {} do not vary: expected {} with a value or with bounds",
-                               settings.place, quotedForMessage(measure), row.keyword));
+                   fmt::format("{}: the observations of {} do not vary{}: expected {} with a value or with bounds{}",
+                               settings.place, quotedForMessage(measure),
+                               isTransformed ? " after the Box-Cox transformation, or too widely for a number" : "",
+                               row.keyword, isTransformed ? ", or another Box_Cox_Shift or Box_Cox_Lambda" : ""));
       }
     }
     if (numbers.size() == 1) {
@@ -175,6 +178,37 @@ double DreamTarget::logLikelihood(const TaskContext& context, int number, std::s
   return std::isnan(sum) ? -kInfinity : sum;
 }
 
+/// Notes why a model run has no likelihood, by the first series without one.
+void DreamTarget::countLack(const TaskContext& context, const EvaluationResult& result, std::span<const double> point) {
+  RunsWithoutLikelihood& runs = withoutLikelihood_;
+  if (!result.ok()) {
+    ++runs.failed;
+    return;
+  }
+  if (objective_) {
+    ++runs.notNumbers;
+    return;
+  }
+  for (const Series& series : series_) {
+    const std::size_t count = context.observedSeries[series.observed].values.size();
+    const std::vector<double> simulated = context.simulatedColumns(std::span(&result.number, 1), series.first, count);
+    switch (series.errors.lackIn(simulated, errorsOf(series, point))) {
+      case LikelihoodLack::none:
+        continue;
+      case LikelihoodLack::missing:
+        ++runs.missing;
+        return;
+      case LikelihoodLack::untransformed:
+        ++runs.untransformed;
+        return;
+      case LikelihoodLack::notFinite:
+        ++runs.notFinite;
+        return;
+    }
+  }
+  ++runs.notFinite;  // of the sum alone
+}
+
 std::vector<ProposalResult> DreamTarget::evaluate(const TaskContext& context,
                                                   std::span<const DreamProposal> proposals) {
   std::vector<ParameterSet> sets;
@@ -198,7 +232,7 @@ std::vector<ProposalResult> DreamTarget::evaluate(const TaskContext& context,
     }
     const auto known = known_.find(number);
     found.push_back({known != known_.end() ? known->second : logLikelihood(context, number, proposal.point), number});
-    if (isNew && found.back().logLikelihood == -kInfinity) ++failures_;
+    if (isNew && found.back().logLikelihood == -kInfinity) countLack(context, *result, proposal.point);
   }
   return found;
 }

@@ -41,8 +41,7 @@ class DreamTarget final {
   std::vector<std::vector<double>> priorDraws(const Feasibility& feasibility, std::size_t count) const;
   const std::vector<Series>& series() const { return series_; }
   ErrorValues errorsOf(const Series& series, std::span<const double> point) const;
-  /// Model runs without a likelihood.
-  int failures() const { return failures_; }
+  const RunsWithoutLikelihood& runsWithoutLikelihood() const { return withoutLikelihood_; }
   std::vector<std::string> descriptionLines() const;
   /// Which observations of a series the likelihood is of, once runs have told.
   struct CountLine {
@@ -67,6 +66,7 @@ class DreamTarget final {
   std::vector<ProposalResult> evaluate(const TaskContext& context, std::span<const DreamProposal> proposals);
   void countObservations(const TaskContext& context, std::span<const EvaluationResult> results);
   double logLikelihood(const TaskContext& context, int number, std::span<const double> point) const;
+  void countLack(const TaskContext& context, const EvaluationResult& result, std::span<const double> point);
   double objectiveOf(const TaskContext& context, const EvaluationResult& result) const;
 
   ParameterDistributions prior_;
@@ -78,7 +78,7 @@ class DreamTarget final {
   bool hasCounted_ = false;               ///< whether successful runs have told which observations count
   /// The log-likelihood of each run if it is an objective function, and -infinity of each that failed.
   std::unordered_map<int, double> known_;
-  int failures_ = 0;
+  RunsWithoutLikelihood withoutLikelihood_;
 };
 
 }  // namespace mirevo

@@ -27,6 +27,12 @@ constexpr std::size_t kMostPriorValues = 4'000'000;  // 32 MB
 constexpr const char* kPriorRefusal = "Error: Prior of DREAM invalid";
 constexpr CodeName kFormName{std::nullopt, "DREAM"};
 
+/// Where the setup gives the prior of variable parameter j, or could.
+SetupSection sectionOfPrior(const SetupSection& section, std::size_t j) {
+  const std::string name = fmt::format("PARAMETER_{}", j + 1);
+  return section.has(name) ? section.openItem("PARAMETER_", j + 1) : section;
+}
+
 /// Of a prior with so high a peak at an end that numbers, which are no finer there, cannot tell its values apart.
 std::vector<std::string> boundWarnings(const Distribution& prior, const SearchSpace& space, std::size_t j) {
   constexpr double kTooMuch = 1e-3;
@@ -40,9 +46,9 @@ std::vector<std::string> boundWarnings(const Distribution& prior, const SearchSp
     texts.push_back(
         fmt::format("{:.2g} % of the prior's probability of {} lies within the rounding of numbers at its {} end, {:g} "
                     "(search scale): a chain that comes there stays. Expected a prior with a density that is finite "
-                    "there, such as that of a beta distribution with an {} of 1 or more, or bounds that leave the end "
+                    "there, such as that of a beta distribution with {} of 1 or more, or bounds that leave the end "
                     "out",
-                    100.0 * probability / all, space.names[j], end, value, end == "lower" ? "Alpha" : "Beta"));
+                    100.0 * probability / all, space.names[j], end, value, end == "lower" ? "an Alpha" : "a Beta"));
   };
   const double above = std::nextafter(lower, std::numeric_limits<double>::infinity());
   const double below = std::nextafter(upper, -std::numeric_limits<double>::infinity());
@@ -80,16 +86,27 @@ void DreamTask::read(const TaskReading& reading) {
                  "proposals that cannot, without a model run");
   }
   prior_ = readDistributions(reading, section);
-  if (const auto discrete = prior_.firstWithoutDensity()) {
-    section.refuse(kPriorRefusal, kUncertaintyTypeKeyword,
-                   fmt::format("the distribution of variable parameter {} has single values: expected one with a "
-                               "density, as chains move in small steps",
-                               *discrete + 1));
-  }
+  refusePriorWithoutDensity(reading, section);
   refuseImpossiblePriors(reading, section);
   dream.sampler.mostRuns = settings.sampleSize;
   readDreamSection(section, reading.measures, reading.objectives, dream);
   checkSize(reading, section);
+}
+
+/// A distribution of single values.
+void DreamTask::refusePriorWithoutDensity(const TaskReading& reading, const SetupSection& section) const {
+  const auto discrete = prior_.firstWithoutDensity();
+  if (!discrete) return;
+  std::string name;
+  std::size_t variable = 0;
+  for (const ModelParameter& parameter : reading.parameters) {
+    if (parameter.parameterType == ParameterType::variable && variable++ == *discrete) name = parameter.name;
+  }
+  sectionOfPrior(section, *discrete)
+      .refuse(kPriorRefusal, kDistributionKeyword,
+              fmt::format("the distribution of {} has single values: expected one with a density, as chains move in "
+                          "small steps",
+                          name));
 }
 
 /// A parameter that has one value only, or whose prior has none between its bounds.
@@ -110,13 +127,12 @@ void DreamTask::refuseImpossiblePriors(const TaskReading& reading, const SetupSe
     constexpr double kLeastShare = 1e-4;  // a draw is tried 100,000 times
     const double share = prior_[j].cumulative(space.upper[j]) - prior_[j].cumulative(space.lower[j]);
     if (share < kLeastShare) {
-      const std::string name = fmt::format("PARAMETER_{}", j + 1);
-      const SetupSection place = section.has(name) ? section.openItem("PARAMETER_", j + 1) : section;
-      place.refuse(kPriorRefusal, kDistributionKeyword,
-                   fmt::format("the prior of {} has a probability of {:.1g} between the bounds {:g} and {:g} (search "
-                               "scale): expected {:g} or more. The bounds are at {}",
-                               space.names[j], share, space.lower[j], space.upper[j], kLeastShare,
-                               parameter.location("Upper_Bound")));
+      sectionOfPrior(section, j)
+          .refuse(kPriorRefusal, kDistributionKeyword,
+                  fmt::format("the prior of {} has a probability of {:.1g} between the bounds {:g} and {:g} (search "
+                              "scale): expected {:g} or more. The bounds are at {}",
+                              space.names[j], share, space.lower[j], space.upper[j], kLeastShare,
+                              parameter.location("Upper_Bound")));
     }
   }
 }
@@ -226,9 +242,9 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   const auto summary =
       summarisePosterior(*sampler_, dimensions, prior, static_cast<std::size_t>(std::max(settings.matrixLimit, 0)));
   const std::string correlationFile = fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation));
-  outcome.report =
-      formatPosterior(dream.sampler, *sampler_, dimensions, summary ? &*summary : nullptr, target_->failures(),
-                      {fileNameOf(runFilePath(context.filePrefix, run_files::kPosterior)), correlationFile});
+  outcome.report = formatPosterior(
+      dream.sampler, *sampler_, dimensions, summary ? &*summary : nullptr, target_->runsWithoutLikelihood(),
+      {fileNameOf(runFilePath(context.filePrefix, run_files::kPosterior)), correlationFile});
   if (target_->hasCounted()) {
     const auto counts = target_->countLines();
     auto place = outcome.report.begin() + 1;
@@ -247,6 +263,11 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   outcome.report.emplace_back();
   outcome.report.insert(outcome.report.end(), bands.begin(), bands.end());
   return outcome;
+}
+
+/// Why there is nothing to say; empty otherwise.
+std::string DreamTask::noLikelihood() const {
+  return noLikelihoodText(*sampler_, target_->runsWithoutLikelihood());
 }
 
 /// A failed run is a likelihood of 0 and no fault, but so many of them end any run: what helps is told with the error.
@@ -282,13 +303,20 @@ TaskOutcome DreamTask::run(const TaskContext& context) {
     }
     if (sampler_->checks().size() == checks) continue;
     checks = sampler_->checks().size();
+    if (!noLikelihood().empty()) continue;
     const ConvergenceCheck& check = sampler_->checks().back();
     context.log.line(
         fmt::format("Generation {}, {} model runs: largest R-hat {:.4g}, least effective sample size {:.0f}",
                     check.generations, check.runs, check.largestRHat(), check.leastEffectiveSize()));
   }
   TaskOutcome outcome = outcomeOf(context);
-  logReport(context, outcome.report);
+  const std::string nothing = noLikelihood();
+  const bool isForUser = !nothing.empty() && context.warnUser;
+  // The user is told with the log.
+  std::vector<std::string> logged = outcome.report;
+  if (isForUser) std::erase(logged, "Warning: " + nothing);
+  logReport(context, logged);
+  if (isForUser) context.warnUser(nothing);
   return outcome;
 }
 

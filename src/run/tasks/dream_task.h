@@ -46,11 +46,13 @@ class DreamTask final : public Task {
   DreamSection dream;
 
  private:
+  void refusePriorWithoutDensity(const TaskReading& reading, const SetupSection& section) const;
   void refuseImpossiblePriors(const TaskReading& reading, const SetupSection& section) const;
   void checkSize(const TaskReading& reading, const SetupSection& section) const;
   std::optional<ParameterSet> priorSet(const SearchSpace& space, const Feasibility& feasibility,
                                        std::string& reason) const;
   void advance();
+  std::string noLikelihood() const;
   TaskOutcome outcomeOf(const TaskContext& context) const;
 
   ParameterDistributions prior_;

@@ -191,10 +191,10 @@ EarlierSample GlueTask::emptySample(const TaskContext& context) const {
   return {.simulatedColumns = context.simulatedColumns, .areCorrelated = settings.distributions.copula().has_value()};
 }
 
-std::vector<std::string> GlueTask::setDoubts(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
+std::vector<SetDoubt> GlueTask::setDoubts(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
   if (isOfEarlierRun() || settings.redrawsInfeasible || !feasibility.isTested()) return {};
   return infeasibleSets(feasibility, drawSample(feasibility).sets, kWhatSets, settings.sampleSize, kInfeasibleRemedy)
-      .texts();
+      .doubts();
 }
 
 std::optional<ParameterSet> GlueTask::trialSet(const SearchSpace& /*space*/, const Feasibility& feasibility) const {

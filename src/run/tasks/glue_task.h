@@ -28,7 +28,7 @@ class GlueTask final : public Task {
   bool readsSimulatedValues() const override { return true; }
   std::optional<KeptSteps> keptSteps() const override;
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
-  std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::vector<SetDoubt> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::string earlierResultFile() const override { return glue.earlierFile; }
   TaskOutcome run(const TaskContext& context) override;

@@ -17,7 +17,9 @@ struct InfeasibleSets {
   bool endsRun = false;  ///< more of them than may fail
 
   /// As Task::setDoubts() returns it.
-  std::vector<std::string> texts() const { return text.empty() ? std::vector<std::string>() : std::vector{text}; }
+  std::vector<SetDoubt> doubts() const {
+    return text.empty() ? std::vector<SetDoubt>() : std::vector{SetDoubt{text, endsRun}};
+  }
 };
 /// As the following; for the user where the run will end early.
 InfeasibleSets infeasibleSets(const Feasibility& feasibility, std::span<const ParameterSet> sets, std::string_view what,

@@ -100,6 +100,11 @@ void MorrisTask::requireSets(const SearchSpace& space, const Feasibility& feasib
              fmt::format("No elementary effect has two sets that can be run: {}", plan.violation));
 }
 
+std::vector<SetDoubt> MorrisTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
+  const std::string text = infeasiblePointsText(planIn(space, feasibility), space.names);
+  return text.empty() ? std::vector<SetDoubt>() : std::vector{SetDoubt{text}};
+}
+
 std::optional<ParameterSet> MorrisTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {
   const EffectPlan& plan = planIn(space, feasibility);
   for (const EffectTrajectory& trajectory : plan.trajectories) {
@@ -129,6 +134,7 @@ TaskOutcome MorrisTask::run(const TaskContext& context) {
     for (const ParameterSet& set : setsOf(plan, trajectory, drawnFrom)) outside.add(set);
   }
   context.log.line(outside.line());
+  for (const SetDoubt& doubt : setDoubts(context.space, context.feasibility)) context.log.warning(doubt.text);
   results_.clear();
   evaluateEffects(plan, drawnFrom, context.evaluator, results_);
   context.log.line(

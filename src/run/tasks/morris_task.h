@@ -22,6 +22,7 @@ class MorrisTask final : public Task {
   bool drawsRandomNumbers() const override { return true; }
   bool usesExactMeasures() const override { return true; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::vector<SetDoubt> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;

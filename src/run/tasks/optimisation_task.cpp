@@ -184,9 +184,9 @@ std::vector<ParameterSet> OptimisationTask::givenSets(const SearchSpace& space) 
   return given;
 }
 
-std::vector<std::string> OptimisationTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
+std::vector<SetDoubt> OptimisationTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
   if (!method || !feasibility.isTested()) return {};
-  return infeasibleSets(feasibility, givenSets(space), kWhatGivenSets, stopping.maxEvaluations).texts();
+  return infeasibleSets(feasibility, givenSets(space), kWhatGivenSets, stopping.maxEvaluations).doubts();
 }
 
 SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasibility& feasibility,

@@ -36,7 +36,7 @@ class OptimisationTask final : public Task {
   bool judgesByAggregate() const override { return !method || !method->facts().findsFront; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
-  std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::vector<SetDoubt> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   /// A search by residuals needs them in every result; one for a front shows those of the front.
   bool keepsSimulatedValues() const override { return method && (method->facts().usesResiduals || keepsFrontSeries_); }
   bool readsSimulatedValues() const override { return keepsFrontSeries_; }

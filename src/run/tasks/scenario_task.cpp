@@ -177,9 +177,9 @@ std::vector<ParameterSet> ScenarioTask::sets(const SearchSpace& space,
                                                   : scenarioSets(settings.runs, parameters);
 }
 
-std::vector<std::string> ScenarioTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
+std::vector<SetDoubt> ScenarioTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
   const std::vector<ParameterSet> all = sets(space, parameters_);
-  return infeasibleSets(feasibility, all, kWhatSets, static_cast<int>(all.size())).texts();
+  return infeasibleSets(feasibility, all, kWhatSets, static_cast<int>(all.size())).doubts();
 }
 
 std::optional<ParameterSet> ScenarioTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {

@@ -35,7 +35,7 @@ class ScenarioTask final : public Task {
   bool runsEverySet() const override { return true; }
   TaskReport report() const override;
   int plannedEvaluations() const override;
-  std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::vector<SetDoubt> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
 

@@ -253,9 +253,9 @@ void SensitivityTask::requireSets(const SearchSpace& /*space*/, const Feasibilit
   if (settings.calculatesCovariance) lapack();
 }
 
-std::vector<std::string> SensitivityTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
+std::vector<SetDoubt> SensitivityTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
   const PerturbationPlan plan = planPerturbations(settings, space, space.initial, {}, feasibility);
-  return infeasibleSets(feasibility, plan.sets, kWhatSets, static_cast<int>(plan.sets.size())).texts();
+  return infeasibleSets(feasibility, plan.sets, kWhatSets, static_cast<int>(plan.sets.size())).doubts();
 }
 
 TaskOutcome SensitivityTask::run(const TaskContext& context) {

@@ -18,7 +18,7 @@ class SensitivityTask final : public Task {
   SeriesPrecision keptPrecision() const override { return SeriesPrecision::exact; }
   bool usesExactMeasures() const override { return true; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
-  std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::vector<SetDoubt> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   TaskReport report() const override { return {.sensitivity = &settings}; }

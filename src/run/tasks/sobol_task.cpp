@@ -203,11 +203,11 @@ std::vector<std::string> SobolTask::warnings(const SearchSpace& space) const {
   return texts;
 }
 
-std::vector<std::string> SobolTask::setDoubts(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
+std::vector<SetDoubt> SobolTask::setDoubts(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
   if (!feasibility.isTested()) return {};
   UniformGenerator random = draw().random;
   const std::vector<ParameterSet> sets = sobolSets(design_, factors_, distributions_, random);
-  return infeasibleSets(feasibility, sets, kWhatSets, static_cast<int>(sets.size()), kInfeasibleRemedy).texts();
+  return infeasibleSets(feasibility, sets, kWhatSets, static_cast<int>(sets.size()), kInfeasibleRemedy).doubts();
 }
 
 std::optional<ParameterSet> SobolTask::trialSet(const SearchSpace& /*space*/, const Feasibility& feasibility) const {

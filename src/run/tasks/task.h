@@ -72,6 +72,12 @@ std::optional<std::string> tooManySets(std::int64_t sets, std::size_t n);
 /// The same of a task that has but a part of its sets in memory.
 std::optional<std::string> tooManySets(std::int64_t sets);
 
+/// What is known of sets that will be evaluated although they cannot be run, before the first model run.
+struct SetDoubt {
+  std::string text;
+  bool endsRun = false;  ///< more of them than may fail: the run will end before it is complete
+};
+
 /// What a task uses when it runs.
 struct TaskContext {
   const SearchSpace& space;
@@ -198,7 +204,7 @@ class Task {
   virtual void requireSets(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {}
 
   /// What run() will warn of before its first model run: sets that will be evaluated although they cannot be run.
-  virtual std::vector<std::string> setDoubts(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {
+  virtual std::vector<SetDoubt> setDoubts(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {
     return {};
   }
   /// For a check of the setup whose initial values cannot be run: a set that can, of those that run() may evaluate.

@@ -91,12 +91,11 @@ void UncertaintyTask::requireSets(const SearchSpace& /*space*/, const Feasibilit
   feasibleUncertaintySample(settings, randomSeed, feasibility);
 }
 
-std::vector<std::string> UncertaintyTask::setDoubts(const SearchSpace& /*space*/,
-                                                    const Feasibility& feasibility) const {
+std::vector<SetDoubt> UncertaintyTask::setDoubts(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
   if (settings.redrawsInfeasible || !feasibility.isTested() || settings.distributions.size() == 0) return {};
   return infeasibleSets(feasibility, uncertaintySample(settings, randomSeed, {}), kWhatSets, settings.sampleSize,
                         kInfeasibleRemedy)
-      .texts();
+      .doubts();
 }
 
 std::optional<ParameterSet> UncertaintyTask::trialSet(const SearchSpace& /*space*/,

@@ -22,7 +22,7 @@ class UncertaintyTask final : public Task {
   bool readsSimulatedValues() const override { return true; }
   std::optional<KeptSteps> keptSteps() const override;
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
-  std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::vector<SetDoubt> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;

@@ -299,6 +299,16 @@ TEST(ElementaryEffects, SetsThatCannotBeRunAreNotHandedOver) {
     for (std::size_t j = 0; j < 3; ++j) EXPECT_EQ(effects.parameters[j].count, 20U - found.plan.infeasible[j]);
     EXPECT_NEAR(effects.parameters[1].mu.value, 2.0, 1e-6);
     EXPECT_EQ(found.plan.infeasiblePoints > 0, design == EffectDesign::trajectories) << "radial ones look elsewhere";
+    // What the plan tells before the first run.
+    const std::vector<std::string> names{"a", "b", "c"};
+    const std::string told = infeasiblePointsText(found.plan, names);
+    EXPECT_EQ(told.find(fmt::format("{} of 80 points of the trajectories cannot be run and ",
+                                    found.plan.infeasiblePoints)) == 0,
+              design == EffectDesign::trajectories);
+    for (std::size_t j = 0; j < 3; ++j) {
+      const std::string lacking = fmt::format("{} ({} of 20)", names[j], found.plan.infeasible[j]);
+      EXPECT_EQ(told.find(lacking) != std::string::npos, found.plan.infeasible[j] > 0) << told;
+    }
   }
 }
 

@@ -21,8 +21,8 @@ struct ShownChains {
     settings.effectiveSize = 200.0;
     chains.emplace(sampled(settings, std::move(problem)));
   }
-  std::vector<std::string> report(const PosteriorSummary* summary, int failures = 0) const {
-    return formatPosterior(settings, *chains, dimensions, summary, failures,
+  std::vector<std::string> report(const PosteriorSummary* summary, const RunsWithoutLikelihood& runs = {}) const {
+    return formatPosterior(settings, *chains, dimensions, summary, runs,
                            {"basin_Posterior.dat", "basin_SampleCorrelation.dat"});
   }
 
@@ -75,8 +75,9 @@ TEST(Posterior, IsOfTheStatesBehindBurnInAndTheAcceptanceRateOfTheirProposals) {
 
 TEST(Posterior, IsSaidNotToBeThereOrNotToHaveConverged) {
   ShownChains shown;
-  const std::vector<std::string> none = shown.report(nullptr, 1);
-  EXPECT_THAT(none, ::testing::Contains(::testing::StartsWith("1 model run failed or had no likelihood")));
+  const std::vector<std::string> none = shown.report(nullptr, {.failed = 1, .untransformed = 3});
+  EXPECT_THAT(none, ::testing::Contains(::testing::StartsWith("4 model runs without a likelihood, whose sets were "
+                                                              "rejected: 1 failed; 3 have simulated values without")));
   EXPECT_THAT(none, ::testing::Contains(::testing::HasSubstr("No posterior: there are fewer than 4 generations")));
   auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior, 1000);
   EXPECT_THAT(shown.report(&*summary), ::testing::Contains(::testing::HasSubstr("The chains have converged")));
@@ -101,6 +102,42 @@ TEST(Posterior, IsSaidNotToBeThereOrNotToHaveConverged) {
     }
     EXPECT_EQ(verdicts, 1);
   }
+}
+
+// Chains that have found no set with a likelihood have figures, too, which would be those of where they began.
+TEST(Posterior, IsNotOfStatesWithoutALikelihood) {
+  const double none = -std::numeric_limits<double>::infinity();
+  const ShownChains shown;
+  const auto reportOf = [&](const DreamSampler& chains, const auto& summary) {
+    return formatPosterior(shown.settings, chains, shown.dimensions, summary ? &*summary : nullptr,
+                           {.untransformed = 300, .notFinite = 100}, {"p.dat", "c.dat"});
+  };
+  const auto nowhere = sampled(untilBudget(400), sampledFunction({-6.0, -6.0}, {6.0, 6.0}, [=](auto) { return none; }));
+  const auto nothing = summarisePosterior(nowhere, shown.dimensions, shown.prior, 1000);
+  EXPECT_FALSE(nothing);
+  EXPECT_THAT(
+      reportOf(nowhere, nothing),
+      ::testing::ElementsAre(
+          ::testing::_, ::testing::_,
+          ::testing::AllOf(::testing::StartsWith("Warning: No posterior: none of the 399 model runs "),
+                           ::testing::HasSubstr("has a likelihood: 300 have simulated values without a Box-Cox"),
+                           ::testing::HasSubstr("; 100 have no finite errors"),
+                           ::testing::HasSubstr(". Zeros have a transformation with"),
+                           ::testing::HasSubstr(" Error_Deviation, Error_Share and Error_Bias must fit"))));
+  // A peak that chains reach late: what they were before is left out.
+  const auto peak = [=](std::span<const double> x) { return std::abs(x[0] - 5.0) < 0.1 ? 0.0 : none; };
+  DreamSettings settings = untilBudget(4'000);
+  settings.burnInShare = 0.0;
+  const auto late = sampled(settings, sampledFunction({-6.0, -6.0}, {6.0, 6.0}, peak));
+  const auto found = summarisePosterior(late, shown.dimensions, shown.prior, 1000);
+  ASSERT_TRUE(found);
+  EXPECT_GT(found->withoutLikelihood, 4U);
+  EXPECT_EQ(found->draws + found->withoutLikelihood, 4 * (late.history().generations() - *late.burnIn()));
+  EXPECT_NEAR(found->dimensions[0].mean, std::exp(5.0), 15.0);
+  EXPECT_THAT(
+      reportOf(late, found),
+      ::testing::Contains(::testing::StartsWith(fmt::format(
+          "Warning: {} states more behind burn-in have no likelihood and are left out", found->withoutLikelihood))));
 }
 
 TEST(Posterior, OfManyDimensionsHasTheLargestCorrelationsAndSaysNothingOfParametersWhileChainsAreApart) {

@@ -28,11 +28,11 @@ TEST(PosteriorWords, SayWhatIsWorstAndWhatToDo) {
                   "(20), a (399). Means")));
 
   const std::vector<DimensionFigures> apart{
-      {"a", 1.2, 9.0, 0.2}, {"b", 1.0, 20.0, 0.95}, {"c", nan, nan, 0.4}, {"d", 1.7, 900.0, 0.95}};
+      {"a", 1.2, 9.0, 0.2}, {"b", 1.0, 20.0, 0.95}, {"c", nan, nan, 0.4}, {"d", 1.7e15, 900.0, 0.95}};
   const ConvergenceWords ofApart = convergenceWords(apart, limits);
   EXPECT_EQ(ofApart.state, Convergence::apart);
   EXPECT_THAT(ofApart.findings,
-              ElementsAre(HasSubstr("above 1.05 for c (nan), d (1.7), a (1.2), and the effective sample "
+              ElementsAre(HasSubstr("above 1.05 for c (not known), d (over 1000), a (1.2), and the effective sample "
                                     "size is below 400 for b (20). The quantiles")));
   const std::vector<std::vector<double>> matrix{
       {1.0, 0.1, -0.95, 0.2}, {0.1, 1.0, nan, 0.69}, {-0.95, nan, 1.0, 0.0}, {0.2, 0.69, 0.0, 1.0}};

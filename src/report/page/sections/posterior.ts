@@ -25,8 +25,8 @@ function finding(text: string, kind: string): HTMLElement {
 
 function verdict(posterior: Posterior): Node[] {
   const good = posterior.state === 'reached';
-  const findings = posterior.state
-    ? posterior.findings!.map((text) => finding(text, good ? 'good' : 'warning'))
+  const findings = posterior.findings
+    ? posterior.findings.map((text) => finding(text, good ? 'good' : 'warning'))
     : [finding(posterior.generationCount > posterior.burnIn + 3 ? 'The table of the posterior cannot be read: whether the chains have converged is not known'
       : 'There is no posterior: the chains have not come far enough beyond burn-in', 'warning')];
   const rates = finite(posterior.chainAcceptance);
@@ -189,6 +189,7 @@ function tracePlan(posterior: Posterior, name: string, traces: Maybe[][], log: b
 
 function chainContent(posterior: Posterior): Node[] {
   const { dimensions, generations, generationCount, chains, logLikelihoods } = posterior;
+  if (generations.length === 0) return [];
   const thinned = generations.length < generationCount || logLikelihoods.length < chains;
   const isDrawn = ({ traces }: PosteriorDimension) => finite(traces.flat()).length > 0;
   const shown = dimensions.filter(isDrawn).slice(0, kMostGrown);
