@@ -93,9 +93,10 @@ function frontFindings({ front }: ReportData, { all }: Repetitions): Finding[] {
   if (greatest === undefined) return others;
   const ofAll = finite(front?.course?.hypervolumes ?? []).at(-1) ?? greatest;
   const near = volumes.filter((volume) => volume >= (1 - kNear) * ofAll).length;
+  const isSingle = front?.ranks.filter((rank) => rank === 1).length === 1;
   return [
     { text: `The front above is that of all ${counted(all.length, 'repetition')} together. The hypervolumes of ${ended.length === all.length ? 'their own fronts' : `the fronts of the ${count(ended.length)} that ${ended.length === 1 ? 'has' : 'have'} ended with one`}, on its scale: least ${number(volumes[0], 6)}, median ${number(quantile(volumes, 0.5), 6)}, greatest ${number(greatest, 6)}; that of all ${number(ofAll, 6)}.` },
-    ...(ended.length < 2 || !(ofAll > 0) ? [] : [near === ended.length
+    ...(ended.length < 2 || !(ofAll > 0) ? [] : isSingle ? [{ text: 'It is a single set, so that there is no trade-off to compare.' }] : [near === ended.length
       ? { kind: 'good' as const, text: `Whatever the seed, the search found nearly the same front: each hypervolume is within ${percent(kNear)} of that of all.` }
       : { kind: 'warning' as const, text: `${count(near)} of ${counted(ended.length, 'repetition')} come within ${percent(kNear)} of the hypervolume of all: the front that a single search finds depends on the seed. A larger budget helps, or taking the front of several repetitions, as here.` }]),
     ...others,
