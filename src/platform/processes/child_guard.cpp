@@ -127,7 +127,7 @@ bool ChildGuard::isThere() const noexcept {
 
 void ChildGuard::relieve() const noexcept {
   // What killed it may have sent this program its signal at once, before the guard is gone.
-  constexpr int kLooks = 10;
+  constexpr int kLooks = 50;
   constexpr timespec kPause{0, 2'000'000};
   const int saved = errno;
   bool isThereStill = true;
