@@ -36,7 +36,9 @@ std::string limitsText(const SobolIndex& index) {
 std::vector<std::size_t> descending(std::span<const SobolIndex> indices) {
   std::vector<std::size_t> order(indices.size());
   std::iota(order.begin(), order.end(), std::size_t{0});
-  const auto key = [&](std::size_t i) { return std::isnan(indices[i].value) ? -std::numeric_limits<double>::infinity() : indices[i].value; };
+  const auto key = [&](std::size_t i) {
+    return std::isnan(indices[i].value) ? -std::numeric_limits<double>::infinity() : indices[i].value;
+  };
   std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) { return key(a) > key(b); });
   return order;
 }
