@@ -102,7 +102,7 @@ class Glm final : public SearchAlgorithm {
   std::deque<Point> starts_;  ///< not used yet, the best first
   std::optional<Point> best_;
   double leastOfRuns_ = std::numeric_limits<double>::infinity();  ///< the least sum to which a run has come
-  std::vector<double> units_;  ///< the finest of each residual
+  std::vector<double> units_;                                     ///< the finest of each residual
 
   // Of the current run:
   std::optional<Point> current_;

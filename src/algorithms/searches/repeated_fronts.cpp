@@ -54,7 +54,8 @@ void addObjectives(const std::string& corner, const std::vector<const Repetition
 
 std::string verdict(const std::vector<const Repetition*>& ended, double least, double ofAll) {
   if (std::ranges::all_of(ended, [](const Repetition* one) { return one->front->size == 1; })) {
-    return "The front of each repetition is a single set, so that there is no trade-off to compare: nothing better than "
+    return "The front of each repetition is a single set, so that there is no trade-off to compare: nothing better "
+           "than "
            "the start was found, or one set is the best in every objective";
   }
   const auto near = std::ranges::count_if(ended, [](const Repetition* one) { return isNearAll(*one->front); });
