@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "integration/program_runner.h"
+#include "temporary_folder.h"
 
 namespace mirevo::testing {
 
@@ -20,9 +21,14 @@ inline std::vector<std::string> jobArguments(int processes) {
 /// mpirun's environment for a job on this machine alone, by shared memory. What MPI itself does not release at its end
 /// is no fault of the program. An abnormal end of the job takes mpirun that many seconds, in which its ranks may end by
 /// themselves. `outlivesRanks`: a rank that is lost does not end the job.
+/// What MPI keeps on disk and in memory lies in a folder of the test: that which all jobs of a user share is removed by
+/// each that finds it empty, also while another one starts in it.
 inline RunningProgram::Environment jobEnvironment(int secondsToEnd = 1, bool outlivesRanks = false) {
+  static const TemporaryFolder sessions;
   return {{"OMPI_MCA_btl", "self,vader"},
           {"OMPI_MCA_btl_vader_single_copy_mechanism", "none"},
+          {"OMPI_MCA_orte_tmpdir_base", sessions.path()},
+          {"OMPI_MCA_btl_vader_backing_directory", sessions.path()},
           {"OMPI_MCA_odls_base_sigkill_timeout", std::to_string(secondsToEnd)},
           {"OMPI_MCA_orte_enable_recovery", outlivesRanks ? "1" : "0"},
           {"ASAN_OPTIONS", "detect_leaks=0"}};
