@@ -124,21 +124,23 @@ std::string shareWarning(const Distribution& distribution, const SearchSpace& sp
 }  // namespace
 
 std::vector<std::string> distributionLines(const ParameterDistributions& distributions, const SearchSpace& space,
-                                           std::string_view section, std::size_t most) {
+                                           std::string_view section) {
+  constexpr std::size_t kMostListed = 50;
   bool areNormal = true;
   for (std::size_t j = 0; j < distributions.size(); ++j) {
     areNormal = areNormal && isNormalOnSearchScale(distributions[j]);
   }
   std::vector<std::string> lines{fmt::format("{}: PARAMETER_n of {} is that of the n-th variable parameter",
                                              areNormal ? "Normal distributions" : "Distributions", section)};
-  for (std::size_t j = 0; j < std::min(distributions.size(), most); ++j) {
+  for (std::size_t j = 0; j < std::min(distributions.size(), kMostListed); ++j) {
     lines.push_back(distributionLine(distributions[j], space, j));
     if (!isInteger(space, j) || !isNormalOnSearchScale(distributions[j])) continue;
     const double mean = distributions[j].quantile(0.5);
     lines.push_back(integerLine(space, j, mean) + belowBoundText(space, j, distributions[j].quantile(0.05)));
   }
-  if (distributions.size() > most) {
-    lines.push_back(fmt::format("  and those of {} more parameters", distributions.size() - most));
+  if (distributions.size() > kMostListed) {
+    lines.push_back(fmt::format("  and those of {}: see {} and the bounds of the parameters in the setup",
+                                countText(distributions.size() - kMostListed, "more parameter"), section));
   }
   if (!distributions.copula()) return lines;
   const std::vector<std::vector<double>>& correlations = distributions.copula()->correlations();

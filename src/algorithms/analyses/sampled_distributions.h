@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstddef>
-#include <limits>
 #include <span>
 #include <string>
 #include <string_view>
@@ -14,11 +13,10 @@
 namespace mirevo {
 
 /// What the log says of the distributions before the run: which one each parameter has, on the search scale and on the
-/// model scale, and which mean centres an integer parameter on a value. `section` has them. Of more parameters than
-/// `most` those of the first are told, and how many there are more.
+/// model scale, and which mean centres an integer parameter on a value. `section` has them. Of many parameters those of
+/// the first are told, and how many there are more.
 std::vector<std::string> distributionLines(const ParameterDistributions& distributions, const SearchSpace& space,
-                                           std::string_view section,
-                                           std::size_t most = std::numeric_limits<std::size_t>::max());
+                                           std::string_view section);
 
 /// One warning per distribution whose mean, that of a normal distribution, is outside the search bounds, or most of
 /// whose values are.

@@ -35,13 +35,6 @@ std::string listed(std::span<const std::pair<std::string, std::string>> named) {
   return list.text();
 }
 
-/// Chains that do not move have one that is not finite or as large as rounding makes it.
-std::string rHatText(double rHat) {
-  constexpr double kLarge = 1000.0;
-  if (std::isnan(rHat)) return "not known";
-  return rHat > kLarge ? fmt::format("over {:g}", kLarge) : fmt::format("{:.3g}", rHat);
-}
-
 /// Of the dimensions that `isMeant` holds for, those with the largest `badness` first; not a number is the worst.
 template <class IsMeant, class Badness>
 std::vector<const DimensionFigures*> worstFirst(std::span<const DimensionFigures> dimensions, const IsMeant& isMeant,
@@ -59,6 +52,12 @@ std::vector<const DimensionFigures*> worstFirst(std::span<const DimensionFigures
 }
 
 }  // namespace
+
+std::string rHatText(double rHat, int digits) {
+  constexpr double kLarge = 1000.0;
+  if (std::isnan(rHat)) return "not known";
+  return rHat > kLarge ? fmt::format("over {:g}", kLarge) : fmt::format("{:.{}g}", rHat, digits);
+}
 
 bool isOfMagnitudes(std::span<const double> priorQuantiles) {
   constexpr double kManyfold = 10.0;

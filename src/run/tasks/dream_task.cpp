@@ -8,6 +8,7 @@
 
 #include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/bayes/posterior.h"
+#include "algorithms/bayes/posterior_words.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "evaluation/failed_run_policy.h"
@@ -21,7 +22,6 @@ namespace mirevo {
 namespace {
 
 constexpr std::size_t kPriorDraws = 40'000;
-constexpr std::size_t kMostListed = 50;  // priors in the log
 constexpr std::size_t kLeastPriorDraws = 1'000;
 constexpr std::size_t kMostPriorValues = 4'000'000;  // 32 MB
 constexpr const char* kPriorRefusal = "Error: Prior of DREAM invalid";
@@ -161,7 +161,7 @@ std::string DreamTask::description() const {
 
 std::vector<std::string> DreamTask::summaryLines(const SearchSpace& space) const {
   const DreamSettings& own = dream.sampler;
-  std::vector<std::string> lines = distributionLines(prior_, space, kUncertaintySection, kMostListed);
+  std::vector<std::string> lines = distributionLines(prior_, space, kUncertaintySection);
   lines.insert(lines.end(),
                {fmt::format("Likelihood: {}", kLikelihoodNames[static_cast<std::size_t>(*dream.errors.form)].name),
                 fmt::format("{} chains, at most {} model runs; the first {:g} of them are burn-in", own.chainCount,
@@ -305,9 +305,10 @@ TaskOutcome DreamTask::run(const TaskContext& context) {
     checks = sampler_->checks().size();
     if (!noLikelihood().empty()) continue;
     const ConvergenceCheck& check = sampler_->checks().back();
-    context.log.line(
-        fmt::format("Generation {}, {} model runs: largest R-hat {:.4g}, least effective sample size {:.0f}",
-                    check.generations, check.runs, check.largestRHat(), check.leastEffectiveSize()));
+    constexpr int kDigits = 4;
+    context.log.line(fmt::format("Generation {}, {} model runs: largest R-hat {}, least effective sample size {:.0f}",
+                                 check.generations, check.runs, rHatText(check.largestRHat(), kDigits),
+                                 check.leastEffectiveSize()));
   }
   TaskOutcome outcome = outcomeOf(context);
   const std::string nothing = noLikelihood();

@@ -12,6 +12,13 @@ using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 
+TEST(PosteriorWords, DoNotTellSizesThatRoundingMakes) {
+  EXPECT_EQ(rHatText(1.0123), "1.01");
+  EXPECT_EQ(rHatText(1.0123, 4), "1.012");
+  EXPECT_EQ(rHatText(1.3e7, 4), "over 1000");
+  EXPECT_EQ(rHatText(INFINITY, 4), "over 1000");
+}
+
 TEST(PosteriorWords, SayWhatIsWorstAndWhatToDo) {
   const double nan = std::nan("");
   const ConvergenceLimits limits{1.05, 400.0};
