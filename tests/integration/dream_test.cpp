@@ -130,6 +130,24 @@ TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBit
   EXPECT_EQ(other.read("basin_TotalBand_1.csv"), bands);
 }
 
+TEST(Dream, GoesOnWhereItsObjectiveFunctionIsNamedInsteadOfNumbered) {
+  const ModelFolder folder;
+  const auto start = [&](int restart, int runs, const char* objective) {
+    return runProgram({writeDream(folder, {.maxEvaluations = runs, .restart = restart},
+                                  fmt::format("Likelihood = 'objective'\n Objective_Function = {}", objective))});
+  };
+  ASSERT_EQ(start(0, 40, "1").exitCode, 0);
+  const ReadTable first = readDataTable(folder.read("basin_Chains.dat"));
+  const ProgramResult goneOn = start(1, 60, "'Fit'");
+  ASSERT_EQ(goneOn.exitCode, 0) << goneOn.error;
+  const ReadTable all = readDataTable(folder.read("basin_Chains.dat"));
+  ASSERT_GT(all.rows.size(), first.rows.size());
+  EXPECT_EQ(all.rows[first.rows.size() / 2], first.rows[first.rows.size() / 2]);
+  const ProgramResult other = start(1, 60, "0");
+  EXPECT_EQ(other.exitCode, 1);
+  EXPECT_THAT(other.error, HasSubstr("Objective_Function of UNCERTAINTY_ESTIMATION/DREAM: 'Fit' then, 0 now"));
+}
+
 TEST(Dream, ItsBandsReachIntoAValidationPeriodThatBearsOnNoLikelihood) {
   const ModelFolder folder;
   std::string observed = folder.read("observed.csv");

@@ -15,9 +15,11 @@
 #include "algorithms/analyses/uncertainty.h"
 #include "common/checksum.h"
 #include "common/files.h"
+#include "common/named_items.h"
 #include "common/text.h"
 #include "common/version.h"
 #include "run/access/setup_schema.h"
+#include "run/tasks/dream_section.h"
 #include "run/tasks/repeated_search.h"
 
 namespace mirevo {
@@ -135,6 +137,23 @@ bool addsRepetitions(const RestartSettings& then, const RestartSettings& now) {
          });
 }
 
+std::string_view withoutQuotes(std::string_view value) {
+  return value.size() >= 2 && value.front() == '\'' ? value.substr(1, value.size() - 2) : value;
+}
+
+/// The value by which two setups are compared: an objective function that DREAM has by its name stands as its number.
+std::string comparedValue(const RestartSettings& settings, const ResultSetting& setting) {
+  if (setting.keyword != kDreamObjectiveKeyword || setting.section != kDreamSectionName) return setting.value;
+  if (!setting.value.starts_with('\'')) return setting.value;
+  std::vector<std::string> names;
+  for (const ResultSetting& other : settings.settings) {
+    if (other.keyword != "Name" || !other.section.starts_with("ObjectiveFunctions/OBJECTIVE_FUNCTIONS/")) continue;
+    names.emplace_back(withoutQuotes(other.value));
+  }
+  const std::vector<std::size_t> meant = itemsNamed(withoutQuotes(setting.value), names);
+  return meant.size() == 1 ? std::to_string(meant.front() + 1) : setting.value;
+}
+
 /// A section for messages: "PARAMETER_3 (X3)" if the item has a name, else its whole path.
 std::string shownSection(const SettingIndex& index, std::string_view section) {
   std::size_t start = 0;
@@ -238,7 +257,8 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
     if (found == before.end()) {
       // An earlier version that did not know the keyword worked like its default.
       if (!setting.isDefault) note(setting, after, fmt::format("absent then, {} now", setting.value));
-    } else if (found->second->value != setting.value && !(isRaised && isBudget(now, setting))) {
+    } else if (comparedValue(then, *found->second) != comparedValue(now, setting) &&
+               !(isRaised && isBudget(now, setting))) {
       note(setting, after, fmt::format("{} then, {} now", found->second->value, setting.value));
     }
   }

@@ -17,8 +17,6 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kObjectiveKeyword = "Objective_Function";
-
 /// The value of the enumerator with this name, of a coded keyword whose codes are names in the order of the
 /// enumerators.
 template <class Enum, std::size_t Count>
@@ -116,7 +114,7 @@ std::vector<KeywordRow> dreamRows() {
             if (const auto* number = std::get_if<std::int32_t>(&value)) s.objective = *number;
             if (const auto* name = std::get_if<std::string>(&value)) s.objectiveName = *name;
           },
-          {.name = kObjectiveKeyword,
+          {.name = kDreamObjectiveKeyword,
            .type = KeywordType::item,
            .defaultValue = "0",
            .range = from(0),
@@ -277,12 +275,13 @@ std::int32_t numberOfObjective(const SetupSection& dream, const std::string& nam
   std::vector<std::string> names;
   for (const ObjectiveFunction& objective : objectives) names.push_back(objective.name);
   const std::vector<std::size_t> meant = itemsNamed(name, names);
-  if (meant.size() > 1) dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword, ambiguityText(name, names, meant));
+  if (meant.size() > 1)
+    dream.refuse(kDreamLikelihoodRefusal, kDreamObjectiveKeyword, ambiguityText(name, names, meant));
   if (meant.size() == 1) return static_cast<std::int32_t>(meant.front()) + 1;
   constexpr std::size_t kMostNamed = 20;
   ShortList known(kMostNamed);
   for (const std::string& each : names) known.add(quotedForMessage(trim(each)));
-  dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword,
+  dream.refuse(kDreamLikelihoodRefusal, kDreamObjectiveKeyword,
                fmt::format("expected 0 to {} or the name of an objective function, {}; found {}", names.size(),
                            known.text(), quotedForMessage(name)));
 }
@@ -299,7 +298,7 @@ void checkDream(const SetupSection& dream, const DreamSection& settings, std::si
   }
   if (settings.errors.form == LikelihoodForm::objective) {
     if (static_cast<std::size_t>(settings.objective) > objectiveCount) {
-      dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword,
+      dream.refuse(kDreamLikelihoodRefusal, kDreamObjectiveKeyword,
                    fmt::format("expected 0 to {}, found {}", objectiveCount, settings.objective));
     }
     return;
@@ -308,10 +307,10 @@ void checkDream(const SetupSection& dream, const DreamSection& settings, std::si
     dream.refuse(kDreamLikelihoodRefusal, kLikelihoodKeyword,
                  "no objective function compares time series: expected 'objective'");
   }
-  if (dream.isWritten(kObjectiveKeyword)) {
-    dream.refuse(kErrorModelRefusal, kObjectiveKeyword,
+  if (dream.isWritten(kDreamObjectiveKeyword)) {
+    dream.refuse(kErrorModelRefusal, kDreamObjectiveKeyword,
                  fmt::format("{} = '{}' does not depend on it: expected 'objective', or no {}", kLikelihoodKeyword,
-                             nameOf(*settings.errors.form), kObjectiveKeyword));
+                             nameOf(*settings.errors.form), kDreamObjectiveKeyword));
   }
 }
 
@@ -319,7 +318,7 @@ void checkDream(const SetupSection& dream, const DreamSection& settings, std::si
 
 const SettingSection<DreamSection>& dreamSection() {
   static const SettingSection<DreamSection> section{
-      {"UNCERTAINTY_ESTIMATION/DREAM", "when `Uncertainty_Type` is 'DREAM'",
+      {kDreamSectionName, "when `Uncertainty_Type` is 'DREAM'",
        "The posterior distribution by Markov chains, DREAM(ZS). `Sample_Size` is the most model runs that it makes, "
        "and at least ten for each chain.",
        dreamRows()}};

@@ -37,6 +37,8 @@ struct DreamSection {
   std::string place;                         ///< of the likelihood, "setup.kdx:14:9"
 };
 
+inline constexpr std::string_view kDreamSectionName = "UNCERTAINTY_ESTIMATION/DREAM";
+inline constexpr std::string_view kDreamObjectiveKeyword = "Objective_Function";
 inline constexpr std::string_view kLikelihoodKeyword = "Likelihood";
 inline constexpr std::string_view kEffectiveSizeKeyword = "Effective_Size";
 inline constexpr std::string_view kDreamRefusal = "Error: Setting of DREAM invalid";

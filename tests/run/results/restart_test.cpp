@@ -73,6 +73,30 @@ TEST_F(RestartSettingsTest, OfAKeywordThatIsRepeatedEachIsCompared) {
   EXPECT_EQ(changesTo({"'x: a'", "'y: b'", "'z: c'"}), Changes({of + "absent then, 'z: c' now"}));
 }
 
+TEST_F(RestartSettingsTest, AnObjectiveFunctionIsTheSameByNameAndByNumber) {
+  const auto settings = [](const std::string& objective, const std::string& second) {
+    const std::string list = "ObjectiveFunctions/OBJECTIVE_FUNCTIONS/OBJECTIVE_";
+    RestartSettings all;
+    all.settings = {{list + "1", "Name", "'Flow'"},
+                    {list + "2", "Name", second},
+                    {"UNCERTAINTY_ESTIMATION/DREAM", "Objective_Function", objective}};
+    return all;
+  };
+  const auto changes = [&](const std::string& then, const std::string& now, const std::string& second = "'flow low'") {
+    const auto read = parseRestartSettings(formatRestartSettings(settings(then, second)));
+    return changedSettings(read.value(), settings(now, "'flow low'"));
+  };
+  for (const auto& [then, now] : {std::pair{"2", "'flow low'"}, {"'Flow Low '", "2"}, {"'FLOW'", "'Flow'"}}) {
+    EXPECT_THAT(changes(then, now), IsEmpty()) << then << " " << now;
+  }
+  const std::string of = "Objective_Function of UNCERTAINTY_ESTIMATION/DREAM: ";
+  EXPECT_THAT(changes("1", "'flow low'"), ElementsAre(of + "1 then, 'flow low' now"));
+  EXPECT_THAT(changes("0", "'Flow'"), ElementsAre(of + "0 then, 'Flow' now"));
+  // The file may have been changed since.
+  EXPECT_THAT(changes("'", "'Flow'"), ElementsAre(of + "' then, 'Flow' now"));
+  EXPECT_THAT(changes("'flow'", "'flow'", "'FLOW'"), testing::Contains(testing::StartsWith("Name of")));
+}
+
 TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDefaultDoes) {
   const RestartSettings now = restartSettings(read());
   RestartSettings then = now;
