@@ -66,7 +66,8 @@ std::vector<ValueField> widestFields(const RunConfig& config) {
 }
 
 /// Puts the outputs of one table behind those of another: p rows each.
-void appendColumns(std::vector<std::vector<double>>& rows, const std::vector<std::vector<double>>& more) {
+template <class Cell>
+void appendColumns(std::vector<std::vector<Cell>>& rows, const std::vector<std::vector<Cell>>& more) {
   rows.resize(std::max(rows.size(), more.size()));
   for (std::size_t i = 0; i < more.size(); ++i) rows[i].insert(rows[i].end(), more[i].begin(), more[i].end());
 }
@@ -192,6 +193,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   for (const SensitivityTable* table : {&found.measures, &found.objectives}) {
     appendColumns(reported.derivatives, table->derivatives);
     appendColumns(reported.dimensionless, table->scaled);
+    appendColumns(reported.problems, table->problems);
   }
   reported.composite = config.objectives.empty() ? found.measures.composite : found.objectives.composite;
   for (const std::size_t i : found.ranking) reported.ranking.push_back(space.names[i]);
@@ -212,6 +214,7 @@ std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity
   const auto derivative = table.column("Derivative");
   const auto scaled = table.column("Scaled");
   const auto composite = table.column("Composite");
+  const auto problem = table.column("Problem");  // not in tables of earlier versions
   if (!kind || !output || !derivative || !scaled || !composite) return damaged;
   ReportedSensitivity found;
   found.parameters = sensitivity.parameters;
@@ -222,6 +225,7 @@ std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity
   for (const std::string& parameter : found.parameters) {
     std::vector<double>& derivatives = found.derivatives.emplace_back();
     std::vector<double>& dimensionless = found.dimensionless.emplace_back();
+    std::vector<std::string>& problems = found.problems.emplace_back();
     // The composite of the last kind is the one that ranks: of measures, objective functions, or the observations.
     double& ranking = found.composite.emplace_back(std::numeric_limits<double>::quiet_NaN());
     for (; row != table.rows.end() && row->front() == parameter; ++row) {
@@ -238,6 +242,7 @@ std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity
       }
       derivatives.push_back(number(*derivative));
       dimensionless.push_back(number(*scaled));
+      problems.push_back(problem ? (*row)[*problem] : std::string());
     }
     if (derivatives.size() != found.outputs.size()) return damaged;
   }

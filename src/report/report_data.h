@@ -146,6 +146,7 @@ struct ReportedSensitivity {
   std::vector<std::string> outputs;  ///< output measures, then objective functions
   std::vector<std::vector<double>> derivatives;
   std::vector<std::vector<double>> dimensionless;
+  std::vector<std::vector<std::string>> problems;  ///< why there is no derivative; empty if they are not known
   std::vector<double> composite;
   bool isOfObservations = false;  ///< the composite, rather than of the objective functions or output measures
   std::vector<std::string> ranking;
@@ -169,7 +170,8 @@ struct ReportedSampleSensitivity {
   std::vector<std::vector<double>> firstOrder;
   std::vector<std::vector<double>> lower;
   std::vector<std::vector<double>> upper;
-  bool areCorrelated = false;  ///< the parameters
+  std::vector<std::string> problems;  ///< of each output: why it has no first-order indices; empty if it has
+  bool areCorrelated = false;         ///< the parameters
 };
 
 /// The evaluation period or a validation period.

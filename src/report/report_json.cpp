@@ -318,6 +318,18 @@ void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) 
   json.member("outputs", sensitivity.outputs);
   json.key("derivatives").rows(sensitivity.derivatives, Digits::drawn);
   json.key("dimensionless").rows(sensitivity.dimensionless, Digits::drawn);
+  const auto isKnown = [](const std::vector<std::string>& row) {
+    return std::ranges::any_of(row, [](const std::string& problem) { return !problem.empty(); });
+  };
+  if (std::ranges::any_of(sensitivity.problems, isKnown)) {
+    json.key("problems").beginArray();
+    for (const std::vector<std::string>& row : sensitivity.problems) {
+      json.beginArray();
+      for (const std::string& problem : row) json.text(problem);
+      json.endArray();
+    }
+    json.endArray();
+  }
   json.key("composite").numbers(sensitivity.composite, Digits::drawn).member("ranking", sensitivity.ranking);
   json.member("isOfObservations", sensitivity.isOfObservations).member("hasBetterFit", sensitivity.hasBetterFit);
   json.key("covariance");

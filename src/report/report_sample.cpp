@@ -1,17 +1,33 @@
 #include "report/report_sample.h"
 
 #include <algorithm>
+#include <cmath>
 #include <filesystem>
 #include <limits>
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sample_sensitivity.h"
 #include "common/data_table.h"
 #include "common/files.h"
 #include "common/run_files.h"
 #include "report/analysis_table.h"
 
 namespace mirevo {
+namespace {
+
+/// Why no parameter has a first-order index for the output in that column; empty if one has, or that is not known.
+std::string problemOf(const ReportedSampleSensitivity& found, std::size_t output, double count) {
+  const auto isUnknown = [output](const std::vector<double>& row) { return std::isnan(row[output]); };
+  if (std::isnan(count) || !std::ranges::all_of(found.firstOrder, isUnknown)) return "";
+  if (count < static_cast<double>(kLeastForIndices)) {
+    return fmt::format("{:.0f} runs with a value are too few, at least {}", count, kLeastForIndices);
+  }
+  if (std::ranges::all_of(found.rankCorrelations, isUnknown)) return "all runs have the same value";
+  return std::string(kNoFiniteVariance);
+}
+
+}  // namespace
 
 std::vector<ReportedDistribution> reportedDistributions(const ParameterDistributions& distributions,
                                                         const SearchSpace& space) {
@@ -58,6 +74,8 @@ std::optional<ReportedSampleSensitivity> reportedSampleSensitivity(const std::st
   const auto parameter = column("Parameter");
   const bool hasColumns =
       kind && output && parameter && std::ranges::all_of(numbers, [](const auto& of) { return of.has_value(); });
+  const auto count = column("Count");
+  std::vector<double> counts;
   bool isWhole = hasColumns && p > 0 && table.rows.size() % p == 0;
   for (std::size_t row = 0; isWhole && row < table.rows.size(); ++row) {
     const std::vector<std::string>& cells = table.rows[row];
@@ -66,6 +84,8 @@ std::optional<ReportedSampleSensitivity> reportedSampleSensitivity(const std::st
     if (j == 0) {
       found.outputs.push_back(cells[*output]);
       found.kinds.push_back(cells[*kind]);
+      constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+      counts.push_back(count ? realCell(cells[*count]).value_or(kNaN) : kNaN);
     }
     for (std::size_t k = 0; k < std::size(members); ++k) {
       (*members[k])[j].push_back(realCell(cells[*numbers[k]]).value_or(std::numeric_limits<double>::quiet_NaN()));
@@ -75,6 +95,7 @@ std::optional<ReportedSampleSensitivity> reportedSampleSensitivity(const std::st
     fault = unshownTable(path);
     return std::nullopt;
   }
+  for (std::size_t k = 0; k < counts.size(); ++k) found.problems.push_back(problemOf(found, k, counts[k]));
   found.areCorrelated = std::ranges::any_of(
       table.headLines, [](const std::string& line) { return line.find("with correlations") != std::string::npos; });
   return found;
@@ -90,7 +111,7 @@ void writeSample(JsonWriter& json, const ReportData& data) {
   if (!data.sampleSensitivity) return;
   const ReportedSampleSensitivity& found = *data.sampleSensitivity;
   json.key("sampleSensitivity").beginObject().member("parameters", found.parameters);
-  json.member("outputs", found.outputs).member("kinds", found.kinds);
+  json.member("outputs", found.outputs).member("kinds", found.kinds).member("problems", found.problems);
   json.key("rankCorrelations").rows(found.rankCorrelations, Digits::drawn);
   json.key("firstOrder").rows(found.firstOrder, Digits::drawn);
   json.key("lower").rows(found.lower, Digits::drawn).key("upper").rows(found.upper, Digits::drawn);

@@ -66,11 +66,13 @@ bool takeIndices(const ReadTable& table, ReportedSobol& sobol) {
       columnsOf(table, {"Kind", "Output", "Parameter", "With", "Order", "Index", "Lower", "Upper", "Blocks"});
   if (!columns || table.rows.empty()) return false;
   const std::vector<std::size_t>& at = *columns;
+  const auto problem = table.column("Problem");  // not in tables of builds before it
   for (const std::vector<std::string>& cells : table.rows) {
     ReportedSobolOutput& output = outputOf(sobol.outputs, cells[at[0]], cells[at[1]]);
     const double blocks = numberAt(cells, at[8]);
     const ReportedSobolIndex index{numberAt(cells, at[5]), numberAt(cells, at[6]), numberAt(cells, at[7]),
-                                   blocks > 0.0 ? static_cast<std::int64_t>(blocks) : 0};
+                                   blocks > 0.0 ? static_cast<std::int64_t>(blocks) : 0,
+                                   problem ? cells[*problem] : std::string()};
     const std::string& order = cells[at[4]];
     if (order == "sum of first") output.sumOfFirst = index;
     if (order.starts_with("sum")) continue;
@@ -153,7 +155,9 @@ void writeIndices(JsonWriter& json, const char* name, const std::vector<Reported
   json.key(name).beginArray();
   for (const ReportedSobolIndex& index : indices) {
     json.beginArray().number(index.value, JsonWriter::Digits::drawn).number(index.lower, JsonWriter::Digits::drawn);
-    json.number(index.upper, JsonWriter::Digits::drawn).integer(index.blocks).endArray();
+    json.number(index.upper, JsonWriter::Digits::drawn).integer(index.blocks);
+    if (!index.problem.empty()) json.text(index.problem);
+    json.endArray();
   }
   json.endArray();
 }

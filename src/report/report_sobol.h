@@ -19,6 +19,7 @@ struct ReportedSobolIndex {
   double lower = 0.0;
   double upper = 0.0;
   std::int64_t blocks = 0;
+  std::string problem = {};  ///< why it, or its limits, are not known; empty if they are
 };
 
 /// The indices of an output measure or objective function, one per factor in the order of the analysis.

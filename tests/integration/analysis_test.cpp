@@ -495,6 +495,10 @@ TEST(Uncertainty, TheLogTellsTheDistributionOfEachParameterAndWarnsOfWhatIsHardl
                              "ln(5) = 1.60944\n"));
   EXPECT_THAT(log, Not(HasSubstr("Mean_Value of PARAMETER_2")));
   EXPECT_THAT(log, HasSubstr("PARAMETER_3: not read: PARAMETER_n is the distribution of the n-th of the 2 variable "));
+  if (folder.exists("basin_Report.html")) {  // not in a build without its page
+    EXPECT_THAT(folder.read("basin_Report.html"),
+                HasSubstr(R"("problems":["40 runs with a value are too few, at least 100")"));
+  }
 
   folder.editSetup("Mean_Value = 5.0", "Mean_Value = 1.6");
   ASSERT_EQ(runProgram({setup}).exitCode, 0);

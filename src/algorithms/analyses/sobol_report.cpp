@@ -90,6 +90,18 @@ std::string dominanceText(const SobolFindings& findings, const SobolIndices& ind
       findings.design.rows, count == 1 ? "s" : "");
 }
 
+/// Why an index of an output, or its limits, are not known; empty if they are.
+std::string problemOf(const SobolFindings& findings, const SobolIndices& indices, const SobolIndex& index) {
+  if (std::string none = whyNoIndices(indices); !none.empty()) return none;
+  if (std::isnan(index.value)) {
+    return index.blocks == 0 ? "no block of the design has all runs that the index needs"
+                             : "its estimate is not a finite number";
+  }
+  if (!std::isnan(index.lower)) return "";
+  if (indices.dominatingBlocks > 0) return "no limits, " + dominanceText(findings, indices);
+  return "no limits, too few blocks of the design have all runs that the index needs";
+}
+
 bool isShown(const SobolFindings& findings, const SobolOutput& output) {
   const auto isObjective = [](const SobolOutput& one) { return one.kind == "objective"; };
   return isObjective(output) || std::ranges::none_of(findings.outputs, isObjective);
@@ -255,7 +267,8 @@ std::vector<DataTable> sobolTables(const SobolFindings& findings) {
     for (const std::size_t j : factor.parameters) members += (members.empty() ? "" : ", ") + findings.parameters[j];
     all.headLines.push_back(fmt::format("Group {}: {}", factor.name, members));
   }
-  all.columns = {"Kind", "Output", "Parameter", "With", "Order", "Index", "Lower", "Upper", "Blocks", "Variance"};
+  all.columns = {"Kind",  "Output", "Parameter", "With",     "Order",  "Index",
+                 "Lower", "Upper",  "Blocks",    "Variance", "Problem"};
   DataTable stages;
   stages.file = run_files::kSobolConvergence;
   stages.headLines = {"Sobol' indices from the first blocks of the design, with limits of 95 %"};
@@ -266,7 +279,8 @@ std::vector<DataTable> sobolTables(const SobolFindings& findings) {
     const auto add = [&](const std::string& parameter, const std::string& with, const char* order,
                          const SobolIndex& index) {
       all.rows.push_back({output.kind, output.name, parameter, with, std::string(order), index.value, index.lower,
-                          index.upper, static_cast<std::int64_t>(index.blocks), indices.variance});
+                          index.upper, static_cast<std::int64_t>(index.blocks), indices.variance,
+                          problemOf(findings, indices, index)});
     };
     for (std::size_t j = 0; j < factors.size(); ++j) {
       add(factors[j].name, "", "first", indices.first[j]);

@@ -434,11 +434,12 @@ function valuesTable(title: string, values: () => Values): HTMLElement {
   details.addEventListener('toggle', () => {
     while (details.children.length > 1) details.lastChild!.remove();
     if (!details.open) return;
-    const { columns, length, row } = values();
+    const { columns, length, row, reason } = values();
     if (length > kRowsShown) {
       details.append(make('p', { class: 'note' }, `${kRowsShown} of ${count(length)} rows, evenly spaced.`));
     }
-    details.append(table(columns, spaced(length, kRowsShown).map(row), title));
+    const places = spaced(length, kRowsShown);
+    details.append(table(columns, places.map(row), title, (place, column) => reason?.(places[place]!, column)));
   });
   return details;
 }

@@ -309,6 +309,7 @@ export interface Sensitivity {
   outputs: string[];
   derivatives: Maybe[][]; // one row per parameter, one column per output
   dimensionless: Maybe[][];
+  problems?: string[][]; // why there is no derivative
   composite: Maybe[];
   hasBetterFit?: boolean; // another set fits better than that of the analysis
   isOfObservations?: boolean; // the composite, rather than of the objective functions or output measures
@@ -345,8 +346,8 @@ export interface Screening {
   parameters: EffectsOfParameter[];
 }
 
-/** An index, the limits that hold it with 95 %, and the blocks of the design that it is of. */
-export type SobolIndex = [Maybe, Maybe, Maybe, number];
+/** An index, the limits that hold it with 95 %, the blocks of the design that it is of, and why it or its limits are not known. */
+export type SobolIndex = [Maybe, Maybe, Maybe, number, string?];
 
 export interface SobolOutput {
   kind: 'measure' | 'objective';
@@ -394,6 +395,7 @@ export interface SampleSensitivity {
   firstOrder: Maybe[][];
   lower: Maybe[][]; // 95 % limits
   upper: Maybe[][];
+  problems?: string[]; // of the outputs: why there are no first-order indices; empty where there are
   areCorrelated: boolean; // the parameters
 }
 

@@ -1,5 +1,7 @@
 // Elements made from text only: names are shown literally and never interpreted as HTML.
 
+import { kMissing } from './format';
+
 type Child = Node | string | null | undefined | false;
 type Attributes = Record<string, string | number | boolean | null | undefined | ((event: Event) => void)>;
 
@@ -28,15 +30,30 @@ export interface Column {
   unit?: string | null;
 }
 
-/** A table in a frame that scrolls sideways where the window is narrow. */
-export function table(columns: Column[], rows: Child[][], label: string): HTMLElement {
+/** Why there is no value in that row and column of a table. */
+export type Reason = (row: number, column: number) => string | null | undefined;
+
+const kMostReasons = 3; // below a table
+
+/** A table in a frame that scrolls sideways where the window is narrow. A value that is missing is a dash that says why, as a line below does. */
+export function table(columns: Column[], rows: Child[][], label: string, reason: Reason = () => null): HTMLElement {
+  const found = new Set<string>();
+  const shown = (cell: Child, row: number, column: number): Child => {
+    const why = cell === '' || cell === kMissing ? reason(row, column) : null;
+    if (!why) return cell;
+    found.add(why);
+    return make('span', { title: why }, kMissing);
+  };
   const kind = (index: number) => (columns[index]?.number ? 'number' : null);
   const head = columns.map((column, index) => make('th', { scope: 'col', class: kind(index), title: column.hint }, column.title));
-  const body = rows.map((row) =>
+  const body = rows.map((row, place) =>
     make('tr', {}, ...row.map((cell, index) =>
-      index === 0 ? make('th', { scope: 'row', class: kind(index) }, cell) : make('td', { class: kind(index) }, cell))));
+      index === 0 ? make('th', { scope: 'row', class: kind(index) }, cell) : make('td', { class: kind(index) }, shown(cell, place, index)))));
+  const reasons = [...found];
+  const more = reasons.length > kMostReasons ? '; others where the pointer rests on a dash' : '';
   return make('div', { class: 'table', role: 'region', 'aria-label': label, tabindex: 0 },
-    make('table', {}, make('thead', {}, make('tr', {}, ...head)), make('tbody', {}, ...body)));
+    make('table', {}, make('thead', {}, make('tr', {}, ...head)), make('tbody', {}, ...body)),
+    reasons.length > 0 && make('p', { class: 'note' }, `${kMissing}: ${reasons.slice(0, kMostReasons).join('; ')}${more}.`));
 }
 
 /** A list to choose from; `chosen` is called with the index. */

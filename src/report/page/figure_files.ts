@@ -1,5 +1,5 @@
 // A figure as a file to take along: its drawing as SVG, or what it draws as CSV.
-import type { Column } from './dom';
+import type { Column, Reason } from './dom';
 import { make } from './dom';
 import { kMissing, moment, number, plainly } from './format';
 
@@ -7,6 +7,7 @@ export interface Values {
   columns: Column[];
   length: number;
   row: (index: number) => string[];
+  reason?: Reason; // of a value that is missing
 }
 
 let setupName = 'report';

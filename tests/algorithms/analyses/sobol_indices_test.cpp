@@ -217,6 +217,7 @@ TEST(SobolReport, SaysWhatCanBeFixedAndWhatInteracts) {
 struct SobolTexts {
   std::string log;
   std::string warnings;
+  std::string problem;  ///< of the last index of the table
 };
 
 SobolTexts textsOf(const SobolDesignRun& run) {
@@ -229,6 +230,7 @@ SobolTexts textsOf(const SobolDesignRun& run) {
   SobolTexts texts;
   for (const std::string& line : formatSobol(findings, "basin_Sobol.dat")) texts.log += line + "\n";
   for (const std::string& warning : sobolWarnings(findings)) texts.warnings += warning + "\n";
+  texts.problem = std::get<std::string>(sobolTables(findings).front().rows.back().back());
   return texts;
 }
 
@@ -244,6 +246,21 @@ TEST(SobolReport, IsNotSureOfWhatNoPointHasMet) {
                                               "(no effect in any block)\n   What acts in less than 4.6 % of the space "
                                               "may have gone unseen in 64 blocks (95 %)"));
   EXPECT_THAT(texts.log, ::testing::Not(::testing::HasSubstr("nan")));
+}
+
+TEST(SobolReport, TheTableSaysWhyAnIndexOrItsLimitsAreMissing) {
+  SobolDesignRun run(corner(0.9999, 0.0), 64);
+  EXPECT_EQ(textsOf(run).problem, "");
+  const std::vector<double> whole = run.values;
+  run.values[run.design.ofAWithB(7, 1)] = 1.0e12;
+  EXPECT_THAT(textsOf(run).problem, ::testing::StartsWith("no limits, 1 of the 64 blocks makes more than 90 %"));
+  run.values = whole;
+  for (std::size_t row = 0; row < 64; ++row) run.values[run.design.ofAWithB(row, 2)] = std::nan("");
+  EXPECT_EQ(textsOf(run).problem, "no block of the design has all runs that the index needs");
+  run.values.assign(whole.size(), 3.0);
+  EXPECT_EQ(textsOf(run).problem, "no parameter has an influence, all runs have the same value");
+  run.values.assign(whole.size(), std::nan(""));
+  EXPECT_EQ(textsOf(run).problem, "no indices, too few runs succeeded");
 }
 
 // The limits of a bootstrap know nothing of the next point in the corner.

@@ -29,6 +29,60 @@ test('what can be fixed is not said to be surer than the sample can show', async
   });
 });
 
+test('what cannot be computed is a dash that says why, in the tables of all analyses', async () => {
+  /** The dashes of a figure's values, or of the table of that name, and the line below. */
+  const missing = async (page, section, name) => {
+    const figure = page.locator(`${section} figure`, { has: page.locator('figcaption', { hasText: name }) }).first();
+    const isFigure = await figure.count() > 0;
+    if (isFigure) await figure.locator('details summary').click();
+    const table = isFigure ? figure.locator('.table') : page.locator(`${section} .table[aria-label="${name}"]`);
+    await table.waitFor();
+    return [await table.locator('td span[title]').evaluateAll((spans) => spans.map((span) => `${span.textContent} ${span.title}`)), await table.locator('.note').allTextContents()];
+  };
+  const screening = sample.dataOf('screening');
+  const [one] = screening.morris;
+  screening.morris = [one];
+  const unknown = { muStar: [null, null, null], mu: [null, null, null], sigma: [null, null, null], share: [null, null, null], effects: 0, rank: 0, rankStability: null, verdict: null };
+  one.parameters.push({ ...one.parameters[0], ...unknown, name: 'stuck' });
+  await withReport(screening, {}, async (page) => {
+    const [dashes, notes] = await missing(page, '#morris', 'Parameters by');
+    assert.equal(dashes.length, 10, dashes);
+    assert.match(notes.join(), /^\u2013: no effect is known: its steps cannot be run or change no value, or their runs failed\.$/);
+  });
+
+  const sobol = sample.dataOf('sobol');
+  const objective = sobol.sobol.outputs.find(({ kind }) => kind === 'objective');
+  const measure = sobol.sobol.outputs.find(({ kind }) => kind === 'measure');
+  objective.total[0] = [...objective.total[0].slice(0, 1), null, null, 3, 'no limits, too few blocks'];
+  measure.total = measure.total.map(() => [null, null, null, 64, 'no parameter has an influence, all runs have the same value']);
+  sobol.sobol.outputs.push({ ...measure, kind: 'objective', name: 'flat' });
+  await withReport(sobol, {}, async (page) => {
+    assert.deepEqual(await missing(page, '#sobol', 'First-order and total indices'), [['\u2013 no limits, too few blocks'], ['\u2013: no limits, too few blocks.']]);
+    const [dashes] = await missing(page, '#sobol', 'Total indices of the output measures');
+    assert.ok(dashes.includes(`\u2013 ${measure.total[0][4]}`), dashes);
+    assert.match(await page.locator('#sobol').textContent(), /flatNo parameter has an influence, all runs have the same value\./);
+  });
+
+  const dream = sample.dataOf('dream');
+  dream.posterior.state = 'apart';
+  Object.assign(dream.posterior.dimensions[1], { rHat: null, effectiveSize: null });
+  await withReport(dream, {}, async (page) => {
+    const why = 'chains that have not moved, or have too few states, have none';
+    assert.deepEqual(await missing(page, '#posterior', 'Parameters before and after the observations'), [[`\u2013 ${why}`, `\u2013 ${why}`], [`\u2013: ${why}.`]]);
+  });
+
+  const local = sample.dataOf('sensitivity');
+  local.sensitivity.derivatives[1][0] = null;
+  local.sensitivity.problems = local.sensitivity.derivatives.map((row) => row.map((value) => (value === null ? 'its runs failed' : '')));
+  await withReport(local, {}, async (page) => assert.deepEqual(await missing(page, '#sensitivity', 'Derivatives'), [['\u2013 its runs failed'], ['\u2013: its runs failed.']]));
+
+  const sampled = sample.dataOf('uncertainty');
+  const found = sampled.sampleSensitivity;
+  for (const name of ['firstOrder', 'lower', 'upper']) found[name] = found[name].map((row) => row.map(() => null));
+  found.problems = found.outputs.map((_, place) => `reason ${place}`);
+  await withReport(sampled, {}, async (page) => assert.match(await page.locator('#sample-sensitivity').textContent(), /There are no first-order indices of [^(]*\(reason \d\)/));
+});
+
 test('a band breaks at its gaps, shows every observed value and says of how many runs it is, without words of a search', async () => {
   const data = sample.dataOf('uncertainty');
   const [band] = data.band;

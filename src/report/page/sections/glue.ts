@@ -93,7 +93,7 @@ export function glueSection(data: ReportData): Section | null {
     id: 'glue',
     title: 'Acceptable sets (GLUE)',
     content: [
-      paragraph(`${count(glue.behavioural)} of ${count(glue.succeeded)} sets are behavioural (${percent(glue.behavioural / glue.succeeded)}); ${glue.choices.join('; ')}.${
+      paragraph(`${count(glue.behavioural)} of ${count(glue.succeeded)} sets are behavioural${glue.succeeded > 0 ? ` (${percent(glue.behavioural / glue.succeeded)})` : ''}; ${glue.choices.join('; ')}.${
         hasWeights ? ` Their weights tell as much as ${number(glue.effective)} sets of equal weight.${whatIsSaid(glue)}` : ' There are no weights, and so neither quantiles nor bands.'}`),
       ...(hasWeights && shown.length > 0 ? [
         heading('Parameters before and after the observations'),

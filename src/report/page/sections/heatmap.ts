@@ -1,6 +1,6 @@
 import { axis, kFileWidth, tip, tooltip, type ChartPlan } from '../chart';
 import type { Maybe } from '../data';
-import { shorten } from '../dom';
+import { shorten, type Reason } from '../dom';
 import { kMissing, number } from '../format';
 import { finite } from '../numbers';
 
@@ -9,9 +9,13 @@ const kNumberRoom = 34; // pixels
 const kNameRoom = 96; // of a column; narrower ones have their names at a slant
 const kBeside = 190; // names of the rows and the scale of colours
 
-/** A matrix, one row of it from top to bottom, coloured from -`extent` over 0 to +`extent`. */
-export function heatmap(title: string, rows: string[], columns: string[], matrix: Maybe[][], extent: number, note: string): ChartPlan {
+/** A matrix, one row of it from top to bottom, coloured from -`extent` over 0 to +`extent`. `reason`: of the matrix's cells without a value. */
+export function heatmap(title: string, rows: string[], columns: string[], matrix: Maybe[][], extent: number, note: string, reason?: Reason): ChartPlan {
   const cells = matrix.flatMap((row, y) => row.map((value, x) => ({ value: [x, y, value ?? NaN], strong: Math.abs(value ?? 0) > 0.7 * extent })));
+  const missing = ([x, y, value]: [number, number, number]): [string, string][] => {
+    const why = Number.isFinite(value) ? null : reason?.(y, x);
+    return why ? [[why, '']] : [];
+  };
   const labelled = rows.length <= kLabelled && columns.length <= kLabelled;
   return {
     title,
@@ -33,7 +37,7 @@ export function heatmap(title: string, rows: string[], columns: string[], matrix
           formatter: (value: number) => number(value, 2), text: [number(extent, 2), number(-extent, 2)],
         },
         tooltip: tooltip(look, { formatter: (cell: { value: [number, number, number] }) =>
-          tip(number(cell.value[2]), [[shorten(rows[cell.value[1]]!, 80), ''], [shorten(columns[cell.value[0]]!, 80), '']]) }),
+          tip(number(cell.value[2]), [...missing(cell.value), [shorten(rows[cell.value[1]]!, 80), ''], [shorten(columns[cell.value[0]]!, 80), '']]) }),
         series: [{
           type: 'heatmap', progressive: 0,
           data: cells.map(({ value, strong }) => (strong ? { value, label: { color: look.inkOnStrong } } : { value })),
@@ -50,6 +54,7 @@ export function heatmap(title: string, rows: string[], columns: string[], matrix
       columns: [{ title: '' }, ...columns.map((name) => ({ title: name, number: true }))],
       length: rows.length,
       row: (index) => [rows[index]!, ...matrix[index]!.map((value) => number(value, 3))],
+      reason: (row, column) => reason?.(row, column - 1),
     }),
   };
 }

@@ -2,7 +2,7 @@
 import { axis, chart, tip, tooltip, type ChartPlan } from '../chart';
 import type { EffectsOfParameter, Limited, Maybe, ReportData, Screening } from '../data';
 import { make, shorten } from '../dom';
-import { count, number, percent } from '../format';
+import { count, counted, kMissing, number, percent } from '../format';
 import { heading, paragraph, type Section } from './section';
 import type { CustomApi } from './uncertainty';
 
@@ -57,8 +57,15 @@ function statements(screening: Screening): Node[] {
   return [make('ul', {}, ...lines)];
 }
 
+/** Why a figure of a parameter is not known. */
+function missing({ effects }: EffectsOfParameter, largest: number): string {
+  if (effects === 0) return 'no effect is known: its steps cannot be run or change no value, or their runs failed';
+  return largest === 0 ? 'no parameter changes the output' : `too few effects (${counted(effects, 'effect')}) for limits`;
+}
+
 function rankedPlan(screening: Screening): ChartPlan {
-  const all = ranked(screening).filter(({ muStar }) => muStar[0] !== null);
+  const listed = ranked(screening);
+  const all = listed.filter(({ muStar }) => muStar[0] !== null);
   const order = all.slice(0, kMostBars);
   const largest = order[0]?.muStar[0] ?? 0;
   const threshold = screening.negligible * largest;
@@ -96,12 +103,13 @@ function rankedPlan(screening: Screening): ChartPlan {
       columns: [{ title: 'Parameter' }, { title: 'Rank', number: true }, { title: '\u03bc*', number: true }, { title: 'Limits', number: true },
         { title: '\u03bc', number: true }, { title: 'Limits', number: true }, { title: '\u03c3', number: true }, { title: 'Limits', number: true },
         { title: 'Of the largest \u03bc*', number: true }, { title: 'At most', number: true }, { title: 'Effects', number: true }, { title: 'Rank holds', number: true }],
-      length: all.length,
+      length: listed.length,
       row: (index) => {
-        const p = all[index]!;
-        return [p.name, `${p.rank}`, number(p.muStar[0]), limits(p.muStar), number(p.mu[0]), limits(p.mu), number(p.sigma[0]), limits(p.sigma),
+        const p = listed[index]!;
+        return [p.name, p.rank > 0 ? `${p.rank}` : kMissing, number(p.muStar[0]), limits(p.muStar), number(p.mu[0]), limits(p.mu), number(p.sigma[0]), limits(p.sigma),
           percent(p.share[0]), percent(p.share[2]), count(p.effects), percent(p.rankStability)];
       },
+      reason: (index) => missing(listed[index]!, largest),
     }),
   };
 }
@@ -155,7 +163,7 @@ export function morrisSection(data: ReportData): Section | null {
   if (shown.length === 0) return null;
   const content = shown.flatMap((screening) => {
     const title = heading(`${kindOf[screening.kind]} ${screening.name}`);
-    if (!screening.parameters.some(({ muStar }) => muStar[0] !== null)) return [title, paragraph('No effect is known.')];
+    if (!screening.parameters.some(({ muStar }) => muStar[0] !== null)) return [title, paragraph('No effect is known: no step could be made, or the runs of all of them failed. The log says which.')];
     return [title, ...statements(screening), chart(rankedPlan(screening)), chart(scatterPlan(screening))];
   });
   return { id: 'morris', title: 'Which parameters matter', content };

@@ -40,6 +40,8 @@ function verdict(posterior: Posterior): Node[] {
 
 type Check = 'rHats' | 'effectiveSizes';
 
+const kNotMoved = 'chains that have not moved, or have too few states, have none';
+
 /** How R-hat or the effective sample sizes of the worst dimensions went on, and where they are to be. */
 function checkPlan(posterior: Posterior, of: Check, limit: number, title: string, note: string): ChartPlan {
   const { checkedRuns, dimensions } = posterior;
@@ -75,6 +77,7 @@ function checkPlan(posterior: Posterior, of: Check, limit: number, title: string
       columns: [{ title: 'Model runs', number: true }, ...dimensions.map(({ name }) => ({ title: name, number: true }))],
       length: checkedRuns.length,
       row: (place) => [count(checkedRuns[place]!), ...dimensions.map((dimension) => number(dimension[of][place], 4))],
+      reason: () => kNotMoved,
     }),
   };
 }
@@ -94,7 +97,8 @@ function knownTable({ dimensions }: Posterior): Node {
     { title: 'Most probable', number: true, hint: 'The state of the largest posterior density' }, { title: 'R\u2011hat', number: true }, { title: 'Eff. size', number: true, hint: 'Independent draws that would tell as much' }];
   const rows = dimensions.map((of) => [of.name, number(of.quantiles[0]), number(of.quantiles[2]), number(of.quantiles[4]), number(of.priorQuantiles[0]), number(of.priorQuantiles[4]),
     percent(of.narrowing, 2), narrowed(of), number(of.mostProbable), number(of.rHat, 3), of.effectiveSize === null ? '' : count(of.effectiveSize)]);
-  return table(columns, rows, 'Parameters before and after the observations');
+  return table(columns, rows, 'Parameters before and after the observations', (_, column) =>
+    (column >= 9 ? kNotMoved : column === 6 || column === 7 ? 'the prior has one value alone' : 'not in the table of the posterior'));
 }
 
 // Nothing while chains are at different places.
@@ -254,7 +258,8 @@ function coverageContent(data: ReportData): Node[] {
     heading('How much of the observed lies in the bands'),
     ...texts.map(paragraph),
     table(columns, shown.map((band) => [band.measure, band.isTotal ? 'what would be observed, with the errors' : 'what the model simulates: uncertainty of the parameters alone', percent(band.inside), band.n === null ? '' : count(band.n),
-      `${number(band.width)}${band.unit && band.width != null ? ` ${shorten(band.unit, 20)}` : ''}`, number(band.relativeWidth, 3)]), 'Observed values within the bands'),
+      `${number(band.width)}${band.unit && band.width != null ? ` ${shorten(band.unit, 20)}` : ''}`, number(band.relativeWidth, 3)]), 'Observed values within the bands',
+    (_, column) => (column === 5 ? 'the observed values do not vary' : 'the file of the band does not tell it')),
   ];
 }
 

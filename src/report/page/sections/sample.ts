@@ -5,7 +5,7 @@ import { shorten } from '../dom';
 import { number } from '../format';
 import { finite } from '../numbers';
 import { heatmap } from './heatmap';
-import { heading, paragraph, type Section } from './section';
+import { heading, isolated, kLogSays, paragraph, type Section } from './section';
 import type { CustomApi } from './uncertainty';
 
 const kMostShown = 40; // parameters with a row of their own
@@ -17,6 +17,8 @@ const column = (matrix: Maybe[][], output: number): Maybe[] => matrix.map((row) 
 function byValue(values: Maybe[]): number[] {
   return values.map((_, place) => place).sort((a, b) => (values[b] ?? -Infinity) - (values[a] ?? -Infinity));
 }
+
+const kSameValues = 'the values of the parameter are all the same';
 
 function indexPlan(found: SampleSensitivity, output: number): ChartPlan {
   const [value, lower, upper, rank] = [found.firstOrder, found.lower, found.upper, found.rankCorrelations].map((matrix) => column(matrix, output)) as [Maybe[], Maybe[], Maybe[], Maybe[]];
@@ -52,27 +54,32 @@ function indexPlan(found: SampleSensitivity, output: number): ChartPlan {
       columns: [{ title: 'Parameter' }, ...['First order', 'Lower', 'Upper', 'Rank correlation'].map((title) => ({ title, number: true }))],
       length: order.length,
       row: (index) => [found.parameters[order[index]!]!, ...[value, lower, upper, rank].map((values) => number(values[order[index]!], 3))],
+      reason: (index) => (rank[order[index]!] == null ? kSameValues : kLogSays),
     }),
   };
 }
 
 export function sampleSection(data: ReportData): Section | null {
   const found = data.sampleSensitivity;
-  if (!found || found.parameters.length === 0 || finite(found.rankCorrelations.flat()).length === 0) return null;
+  if (!found || found.parameters.length === 0 || found.outputs.length === 0) return null;
   const places = found.outputs.map((_, place) => place);
   const objectives = places.filter((place) => found.kinds[place] === 'objective');
-  const charted = (objectives.length > 0 ? objectives : places).filter((place) => finite(column(found.firstOrder, place)).length > 0);
+  const judged = objectives.length > 0 ? objectives : places;
+  const problem = (place: number) => found.problems?.[place] || kLogSays;
+  const without = judged.filter((place) => finite(column(found.firstOrder, place)).length === 0);
+  const charted = judged.filter((place) => finite(column(found.firstOrder, place)).length > 0);
   const order = byValue(found.rankCorrelations.map((row) => Math.max(0, ...finite(row).map(Math.abs)))).slice(0, kMostShown);
   return {
     id: 'sample-sensitivity',
     title: 'What the outputs depend on',
     content: [
       paragraph(`Of the runs of the sample, without further ones. ${found.areCorrelated ? 'The parameters were drawn with correlations: an index has what the parameter shares with others.' : 'What parameters do together with others does not show in their own indices.'}`),
-      ...(charted.length > 0 ? charted.slice(0, kMostOutputs).map((place) => chart(indexPlan(found, place)))
-        : [paragraph('There are too few runs for first-order indices.')]),
-      heading('Rank correlations'),
-      chart(heatmap('Rank correlation of outputs and parameters', order.map((place) => found.parameters[place]!), found.outputs,
-        order.map((place) => found.rankCorrelations[place]!), 1, 'Spearman: 1 where the output always rises with the parameter, \u22121 where it always falls.')),
+      ...charted.slice(0, kMostOutputs).map((place) => chart(indexPlan(found, place))),
+      ...(without.length > 0 ? [paragraph(`There are no first-order indices of ${without.slice(0, kMostOutputs).map((place) => `${isolated(found.outputs[place]!)} (${problem(place)})`).join(', ')}${
+        without.length > kMostOutputs ? ` and ${without.length - kMostOutputs} more` : ''}.`)] : []),
+      ...(finite(found.rankCorrelations.flat()).length === 0 ? [] : [heading('Rank correlations'), chart(heatmap('Rank correlation of outputs and parameters', order.map((place) => found.parameters[place]!), found.outputs,
+        order.map((place) => found.rankCorrelations[place]!), 1, 'Spearman: 1 where the output always rises with the parameter, \u22121 where it always falls.',
+        (_, output) => (finite(column(found.rankCorrelations, output)).length > 0 ? kSameValues : problem(output))))]),
     ],
   };
 }

@@ -29,5 +29,8 @@ export function findingList(all: Finding[]): HTMLElement {
   return make('ul', { class: 'findings' }, ...all.map(({ text, kind }) => make('li', { class: kind }, text)));
 }
 
+/** Of a value that the data do not explain. */
+export const kLogSays = 'the log says why';
+
 /** A name in a sentence, isolated: one that is written from right to left does not turn the sentence around. */
 export const isolated = (name: string) => `\u2068${shorten(name, 60)}\u2069`;

@@ -5,7 +5,7 @@ import { make, shorten, table } from '../dom';
 import { number, percent } from '../format';
 import { placeBetweenBounds } from '../numbers';
 import { extentOf, heatmap } from './heatmap';
-import { heading, paragraph, type Section } from './section';
+import { heading, kLogSays, paragraph, type Section } from './section';
 import type { CustomApi } from './uncertainty';
 
 const rowHeight = (rows: number) => 56 + Math.max(16, Math.min(30, 900 / rows)) * rows;
@@ -39,6 +39,7 @@ function rankedPlan({ parameters, ranking, composite, isOfObservations }: Sensit
       columns: [{ title: 'Parameter' }, { title: 'Composite', number: true }],
       length: order.length,
       row: (index) => [order[index]!, number(valueOf.get(order[index]!))],
+      reason: () => 'it has no derivatives; the log says why',
     }),
   };
 }
@@ -116,7 +117,8 @@ export function covarianceContent(data: ReportData, covariance: Covariance, ofSe
     paragraph('What the limits assume:'),
     make('ul', {}, ofSet, ...kAssumptions.map((text) => make('li', {}, text))),
     ...(covariance.lagText ? [paragraph(`${covariance.lagText}.`)] : []),
-    table(columns, rows, 'Confidence limits'),
+    table(columns, rows, 'Confidence limits', (index, column) =>
+      (column === 5 && covariance.standardDeviation[index] != null ? 'the estimate is 0' : 'there are no more observations than parameters, and the variance of the errors is not known')),
     ...(covariance.leftOut.length > 0 ? [paragraph(`Left out: ${covariance.leftOut.map(({ name, reason }) => `\u2068${shorten(name, 60)}\u2069 (\u2068${reason}\u2069)`).join('; ')}.`)] : []),
     chart(confidencePlan(data, covariance)),
     ...correlationContent(covariance),
@@ -128,13 +130,15 @@ export function sensitivitySection(data: ReportData): Section | null {
   if (!sensitivity || sensitivity.parameters.length === 0) return null;
   const { parameters, outputs, derivatives, dimensionless } = sensitivity;
   const content: Node[] = [chart(rankedPlan(sensitivity))];
+  const problem = (row: number, output: number) => sensitivity.problems?.[row]?.[output] || kLogSays;
   if (dimensionless?.length > 0 && outputs.length > 0) {
     content.push(chart(heatmap('Dimensionless sensitivities', parameters, outputs, dimensionless, extentOf(dimensionless),
-      'Relative change of an output for a relative change of a parameter; the sign is that of the change.')));
+      'Relative change of an output for a relative change of a parameter; the sign is that of the change.',
+      (row, output) => (derivatives[row]?.[output] == null ? problem(row, output) : 'the output is 0'))));
   }
   if (derivatives?.length > 0 && outputs.length > 0) {
     content.push(heading('Derivatives'), table([{ title: 'Parameter' }, ...outputs.map((title) => ({ title: shorten(title, 40), hint: title, number: true }))],
-      parameters.map((name, index) => [name, ...outputs.map((_, column) => number(derivatives[index]?.[column]))]), 'Derivatives'));
+      parameters.map((name, index) => [name, ...outputs.map((_, column) => number(derivatives[index]?.[column]))]), 'Derivatives', (row, column) => problem(row, column - 1)));
   }
   const ofSet = sensitivity.hasBetterFit
     ? make('li', {}, 'The set is the one that fits best. ', make('strong', {}, 'It is not: a warning at the top says which fits better, and the limits mislead.'))

@@ -2,11 +2,11 @@
 import { axis, chart, legend, lineEntries, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import type { Maybe, ReportData, Sobol, SobolIndex, SobolOutput, SobolSeries } from '../data';
 import { make, shorten, table } from '../dom';
-import { count, moment, number, percent } from '../format';
+import { count, kMissing, moment, number, percent } from '../format';
 import { nearest } from '../lines';
 import { finite } from '../numbers';
 import { extentOf, heatmap } from './heatmap';
-import { heading, paragraph, type Section } from './section';
+import { heading, kLogSays, paragraph, type Section } from './section';
 import { labelOf } from './series';
 import type { CustomApi } from './uncertainty';
 
@@ -14,6 +14,8 @@ const kMostLines = 8; // factors with a line of their own
 const kMostRows = 40;
 
 const limits = ([, lower, upper]: SobolIndex) => (lower === null || upper === null ? 'no limits' : `${number(lower, 3)} to ${number(upper, 3)}`);
+
+const missing = (index: SobolIndex | undefined) => index?.[4] || kLogSays;
 
 /** The places of the factors, that with the largest total index first. */
 function byTotal(output: SobolOutput): number[] {
@@ -69,8 +71,9 @@ function indexPlan({ factors, negligible }: Sobol, output: SobolOutput): ChartPl
       length: order.length,
       row: (row) => {
         const place = order[row]!;
-        return [factors[place]!, ...kinds.flatMap(({ of }) => [number(of[place]![0], 4), limits(of[place]!)]), count(output.total[place]![3] ?? 0)];
+        return [factors[place]!, ...kinds.flatMap(({ of }) => [number(of[place]![0], 4), of[place]![1] === null ? kMissing : limits(of[place]!)]), count(output.total[place]![3] ?? 0)];
       },
+      reason: (row, column) => missing(kinds[column < 3 ? 0 : 1]!.of[order[row]!]),
     }),
   };
 }
@@ -100,6 +103,7 @@ function convergencePlan({ factors }: Sobol, output: SobolOutput): ChartPlan {
       columns: [{ title: 'Blocks', number: true }, ...shown.map((place) => ({ title: factors[place]!, number: true }))],
       length: output.rows.length,
       row: (stage) => [count(output.rows[stage]!), ...shown.map((place) => number(output.stages[stage]!.total[place]?.[0], 4))],
+      reason: () => 'too few of these blocks have all runs that the index needs, or their values do not vary',
     }),
   };
 }
@@ -153,6 +157,7 @@ function seriesPlan({ factors }: Sobol, series: SobolSeries): ChartPlan {
       length: times.length,
       row: (place) => [moment(times[place]!, step), number(series.observed[place]), number(series.mean[place]),
         ...factors.flatMap((_, factor) => [number(series.first[factor]?.[place], 3), number(series.total[factor]?.[place], 3)])],
+      reason: (_, column) => (column === 1 ? 'not observed' : 'the runs do not differ at this time, or too few have a value'),
     }),
   };
 }
@@ -187,25 +192,31 @@ export function sobolSection(data: ReportData): Section | null {
   if (!sobol || sobol.factors.length === 0) return null;
   const hasValues = (output: SobolOutput) => output.total.some(([value]) => value !== null);
   const objectives = sobol.outputs.filter(({ kind }) => kind === 'objective');
-  const shown = (objectives.length > 0 ? objectives : sobol.outputs).filter(hasValues);
-  const others = sobol.outputs.filter((output) => hasValues(output) && !shown.includes(output));
+  const shown = objectives.length > 0 ? objectives : sobol.outputs;
+  const others = sobol.outputs.filter((output) => !shown.includes(output));
   const content: Node[] = [];
   for (const output of shown) {
+    if (!hasValues(output)) {
+      const why = missing(output.total[0]);
+      content.push(heading(output.name), paragraph(why === kLogSays ? `There are no indices; ${why}.` : `${why[0]!.toUpperCase()}${why.slice(1)}.`));
+      continue;
+    }
     content.push(heading(output.name), verdict(sobol, output), chart(indexPlan(sobol, output)));
     if (output.rows.length > 1) content.push(chart(convergencePlan(sobol, output)));
     if (output.second.length > 0) {
       content.push(chart(heatmap(`Interactions of two: ${output.name}`, sobol.factors, sobol.factors, output.second, extentOf(output.second),
-        'Indices of second order: the share of the variance that comes from the interaction of the two alone.')));
+        'Indices of second order: the share of the variance that comes from the interaction of the two alone.',
+        (row, column) => (row === column ? 'no interaction of a parameter with itself' : 'no block of the design has all runs that the index needs'))));
     }
   }
   if (others.length > 0) {
     content.push(heading('Total indices of the output measures'), table(
       [{ title: 'Parameter' }, ...others.map(({ name }) => ({ title: shorten(name, 40), hint: name, number: true }))],
-      sobol.factors.map((name, place) => [name, ...others.map(({ total }) => number(total[place]![0], 3))]), 'Total indices of the output measures'));
+      sobol.factors.map((name, place) => [name, ...others.map(({ total }) => number(total[place]![0], 3))]), 'Total indices of the output measures',
+      (row, column) => missing(others[column - 1]?.total[row])));
   }
   for (const series of sobol.series.filter(({ mean }) => finite(mean).length > 0)) {
     content.push(heading(series.measure), chart(seriesPlan(sobol, series)));
   }
-  if (content.length === 0) content.push(paragraph('No output changes with any parameter.'));
   return { id: 'sobol', title: 'Sobol\u2019 indices', content };
 }

@@ -196,6 +196,7 @@ function bandPlan(band: Band, period: [number, number] | null): ChartPlan {
       length: times.length,
       row: (place) => [moment(times[place]!, step), ...[band.observed, band.p5, band.p50, band.p95].map((values) => number(values[place])),
         ...(band.runs ? [count(band.runs[place] ?? 0)] : [])],
+      reason: (_, column) => (column === 1 ? 'not observed' : 'no run has a value at this time'),
     }),
   };
 }
