@@ -32,9 +32,24 @@ bool hasSeveralObjectives(std::string_view algorithm) {
          std::end(kBySeveralObjectives);
 }
 
-void addFront(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount, bool isExpected,
-              ReportData& data, std::vector<std::string>& faults) {
-  if (!isExpected && !isThere(filePrefix, run_files::kPareto)) return;
+void addFront(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount, ReportData& data,
+              std::vector<std::string>& faults) {
+  if (!isThere(filePrefix, run_files::kPareto)) {
+    if (!hasSeveralObjectives(data.run.algorithm)) return;
+    // It is computed when the search ends, or is ended by the kill file or an error, and not by a signal.
+    const std::string name = fileNameOf(runFilePath(filePrefix, run_files::kPareto));
+    if (data.run.stage == RunStage::running) {
+      faults.push_back(fmt::format("There is no front yet: {} is written when the search ends", name));
+      return;
+    }
+    if (data.run.stage != RunStage::finished) {
+      faults.push_back(
+          fmt::format("No front was written, as the run was not finished. Started again with the same setup and "
+                      "Restart = 1, it goes on and writes {}",
+                      name));
+      return;
+    }
+  }
   data.front = reportedFront(filePrefix, config.objectives.size(), variableCount, faults);
   const std::vector<std::size_t> pairs = measuresOfDistinctPairs(config.measures);
   if (!data.front || pairs.empty()) return;
@@ -59,7 +74,7 @@ void addSearchTables(const RunConfig& config, const std::string& filePrefix, std
     fault = fileNameOf(runFilePath(filePrefix, run_files::kEstimateLimits)) + " is not there";
   }
   if (!fault.empty()) faults.push_back(fmt::format("The limits of the parameters are not shown: {}", fault));
-  addFront(config, filePrefix, variableCount, isFinished && hasSeveralObjectives(data.run.algorithm), data, faults);
+  addFront(config, filePrefix, variableCount, data, faults);
   data.repetitions = reportedRepetitions(filePrefix, variableCount, faults);
   for (const std::string& text : faults) data.run.notes.push_back(text + ".");
 }
