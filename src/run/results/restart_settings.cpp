@@ -224,7 +224,7 @@ int searchRepetitions(const RestartSettings& settings) {
 
 std::string repetitionsRemedy(const RestartSettings& then, const RestartSettings& now) {
   const int before = searchRepetitions(then);
-  const int further = searchRepetitions(now) - before;
+  const std::int64_t further = std::int64_t{searchRepetitions(now)} - before;
   if (further <= 0 || !areSideBySide(now)) return {};
   std::string text =
       "Repetitions side by side take turns: evaluations of further ones would have stood among those that were made. ";
