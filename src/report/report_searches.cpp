@@ -14,6 +14,7 @@
 #include "report/report_analyses.h"
 #include "report/report_front.h"
 #include "report/report_repetitions.h"
+#include "run/results/restart_settings.h"
 #include "run/results/series_table.h"
 
 namespace mirevo {
@@ -32,21 +33,24 @@ bool hasSeveralObjectives(std::string_view algorithm) {
          std::end(kBySeveralObjectives);
 }
 
+/// Of what is computed when the search ends, or is ended by the kill file or an error, and not by a signal.
+std::string unwrittenText(std::string_view what, const std::string& filePrefix, const RunFile& file, RunStage stage) {
+  const std::string name = fileNameOf(runFilePath(filePrefix, file));
+  if (stage == RunStage::running)
+    return fmt::format("There is no {} yet: {} is written when the search ends", what, name);
+  return fmt::format(
+      "No {} was written, as the run was not finished. Started again with the same setup and Restart = 1, it goes on "
+      "and "
+      "writes {}",
+      what, name);
+}
+
 void addFront(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount, ReportData& data,
               std::vector<std::string>& faults) {
   if (!isThere(filePrefix, run_files::kPareto)) {
     if (!hasSeveralObjectives(data.run.algorithm)) return;
-    // It is computed when the search ends, or is ended by the kill file or an error, and not by a signal.
-    const std::string name = fileNameOf(runFilePath(filePrefix, run_files::kPareto));
-    if (data.run.stage == RunStage::running) {
-      faults.push_back(fmt::format("There is no front yet: {} is written when the search ends", name));
-      return;
-    }
     if (data.run.stage != RunStage::finished) {
-      faults.push_back(
-          fmt::format("No front was written, as the run was not finished. Started again with the same setup and "
-                      "Restart = 1, it goes on and writes {}",
-                      name));
+      faults.push_back(unwrittenText("front", filePrefix, run_files::kPareto, data.run.stage));
       return;
     }
   }
@@ -76,6 +80,10 @@ void addSearchTables(const RunConfig& config, const std::string& filePrefix, std
   if (!fault.empty()) faults.push_back(fmt::format("The limits of the parameters are not shown: {}", fault));
   addFront(config, filePrefix, variableCount, data, faults);
   data.repetitions = reportedRepetitions(filePrefix, variableCount, faults);
+  const bool isRepeated = searchRepetitions({{}, config.resultSettings, {}, {}}) > 1;
+  if (isRepeated && !isFinished && !isThere(filePrefix, run_files::kRepetitions)) {
+    faults.push_back(unwrittenText("table of the repetitions", filePrefix, run_files::kRepetitions, data.run.stage));
+  }
   for (const std::string& text : faults) data.run.notes.push_back(text + ".");
 }
 

@@ -286,6 +286,21 @@ TEST_F(Repeated, WhatEndsARunLeavesTheRepetitionsAsFarAsTheyHadCome) {
   }
 }
 
+TEST_F(Repeated, TheReportOfARunThatASignalEndedSaysWhyItHasNone) {
+  folder_.useScript("echo >>../calls; while test $(wc -l <../calls) -gt 5; do sleep 0.05; done");
+  writeSetup({.maxEvaluations = 4}, 2, "");
+  const auto report = [&] {
+    EXPECT_EQ(RunningProgram({setup_}, {}, MIREVO_REPORT).wait().exitCode, 0);
+    return folder_.read("basin_Report.html");
+  };
+  RunningProgram program({setup_});
+  ASSERT_TRUE(waitUntil([&] { return occurrences(folder_.read("calls"), "\n") > 5; }));
+  EXPECT_THAT(report(), HasSubstr("There is no table of the repetitions yet"));
+  program.send(SIGTERM);
+  EXPECT_EQ(program.wait().exitCode, 128 + SIGTERM);
+  EXPECT_THAT(report(), HasSubstr("No table of the repetitions was written, as the run was not finished. Started"));
+}
+
 TEST_F(Repeated, ASetupIsCheckedWithItsRepetitions) {
   const std::tuple<RunSettings, int, std::string, const char*> refused[] = {
       {{}, 0, "", "Error: No. of repetitions of the search invalid"},
