@@ -19,8 +19,9 @@ namespace {
 
 /// Columns of the table before those of the parameters, behind which the last one stands. The ones from kOptional on
 /// are there as the search and the version have them.
-constexpr std::string_view kColumns[] = {"Repetition", "Seed",  "Evaluations",     "Best_Evaluation",
-                                         "Aggregate",  "Loops", "Start_Aggregate", "Hypervolume"};
+constexpr std::string_view kColumns[] = {"Repetition",      "Seed",        "Evaluations",
+                                         "Best_Evaluation", "Aggregate",   "Loops",
+                                         "Start_Aggregate", "Hypervolume", "Same_As"};
 constexpr std::size_t kOptional = 6;
 constexpr std::string_view kLastColumn = "Termination";
 
@@ -71,7 +72,8 @@ std::optional<ReportedRepetition> readRepetition(const std::vector<std::string>&
                          {},
                          cells.back(),
                          realIn(6),
-                         realIn(7)};
+                         realIn(7),
+                         places.columns[8] ? wholeIn(8).value_or(0) : 0};
   for (std::size_t i = places.firstParameter; i + 1 < cells.size(); ++i) one.parameters.push_back(numberIn(cells[i]));
   return one;
 }
@@ -106,7 +108,7 @@ NearlyEqual nearlyEqualOf(const std::vector<ReportedRepetition>& all) {
   double least = std::numeric_limits<double>::infinity();
   std::vector<double> starts;
   for (const ReportedRepetition& one : all) {
-    if (one.termination.empty() || one.best == 0) continue;
+    if (one.termination.empty() || one.best == 0 || one.sameAs != 0) continue;
     if (one.aggregate < least) least = one.aggregate;
     starts.push_back(one.start);
   }
@@ -151,6 +153,7 @@ void writeRepetitions(JsonWriter& json, const ReportedRepetitions& repetitions) 
     json.beginObject().member("number", one.number).member("seed", one.seed).member("evaluations", one.evaluations);
     json.member("best", one.best).member("aggregate", one.aggregate).member("loops", one.loops);
     json.member("start", one.start);
+    if (one.sameAs != 0) json.member("sameAs", one.sameAs);
     if (std::isfinite(one.hypervolume)) json.member("hypervolume", one.hypervolume);
     json.key("parameters").numbers(one.parameters, JsonWriter::Digits::table);
     json.member("termination", one.termination).endObject();

@@ -22,6 +22,7 @@ struct ReportedRepetition {
   std::string termination;                                        ///< why it stopped
   double start = std::numeric_limits<double>::quiet_NaN();        ///< the least aggregate with which it began
   double hypervolume = std::numeric_limits<double>::quiet_NaN();  ///< of its front; NaN if it finds none
+  int sameAs = 0;  ///< the number of an earlier one that is the same search
 };
 
 /// Successive evaluations that are of one repetition.

@@ -14,6 +14,7 @@
 #include "report/report_analyses.h"
 #include "report/report_front.h"
 #include "report/report_repetitions.h"
+#include "run/results/restart_settings.h"
 #include "run/results/series_table.h"
 
 namespace mirevo {
@@ -32,9 +33,27 @@ bool hasSeveralObjectives(std::string_view algorithm) {
          std::end(kBySeveralObjectives);
 }
 
-void addFront(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount, bool isExpected,
-              ReportData& data, std::vector<std::string>& faults) {
-  if (!isExpected && !isThere(filePrefix, run_files::kPareto)) return;
+/// Of what is computed when the search ends, or is ended by the kill file or an error, and not by a signal.
+std::string unwrittenText(std::string_view what, const std::string& filePrefix, const RunFile& file, RunStage stage) {
+  const std::string name = fileNameOf(runFilePath(filePrefix, file));
+  if (stage == RunStage::running)
+    return fmt::format("There is no {} yet: {} is written when the search ends", what, name);
+  return fmt::format(
+      "No {} was written, as the run was not finished. Started again with the same setup and Restart = 1, it goes on "
+      "and "
+      "writes {}",
+      what, name);
+}
+
+void addFront(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount, ReportData& data,
+              std::vector<std::string>& faults) {
+  if (!isThere(filePrefix, run_files::kPareto)) {
+    if (!hasSeveralObjectives(data.run.algorithm)) return;
+    if (data.run.stage != RunStage::finished) {
+      faults.push_back(unwrittenText("front", filePrefix, run_files::kPareto, data.run.stage));
+      return;
+    }
+  }
   data.front = reportedFront(filePrefix, config.objectives.size(), variableCount, faults);
   const std::vector<std::size_t> pairs = measuresOfDistinctPairs(config.measures);
   if (!data.front || pairs.empty()) return;
@@ -59,8 +78,12 @@ void addSearchTables(const RunConfig& config, const std::string& filePrefix, std
     fault = fileNameOf(runFilePath(filePrefix, run_files::kEstimateLimits)) + " is not there";
   }
   if (!fault.empty()) faults.push_back(fmt::format("The limits of the parameters are not shown: {}", fault));
-  addFront(config, filePrefix, variableCount, isFinished && hasSeveralObjectives(data.run.algorithm), data, faults);
+  addFront(config, filePrefix, variableCount, data, faults);
   data.repetitions = reportedRepetitions(filePrefix, variableCount, faults);
+  const bool isRepeated = searchRepetitions({{}, config.resultSettings, {}, {}}) > 1;
+  if (isRepeated && !isFinished && !isThere(filePrefix, run_files::kRepetitions)) {
+    faults.push_back(unwrittenText("table of the repetitions", filePrefix, run_files::kRepetitions, data.run.stage));
+  }
   for (const std::string& text : faults) data.run.notes.push_back(text + ".");
 }
 

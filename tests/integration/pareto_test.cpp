@@ -225,6 +225,39 @@ TEST_F(Pareto, ResultsAreTheSameOnAnyNumberOfSlotsAfterAnInterruptionAndWithARai
   }
 }
 
+TEST_F(Pareto, ARunThatIsEndedInItsFirstBatchHasTheFrontOfItsRowsAndOneThatASignalEndsSaysWhereItIs) {
+  folder_.useScript("echo >>../calls; while test -e ../wait && test $(wc -l <../calls) -gt 5; do sleep 0.05; done");
+  const auto endAfterFive = [&](const auto& end, int exitCode) {
+    folder_.write("wait", "");
+    folder_.write("calls", "");
+    writeSetup({.search = "NSGA-II", .maxEvaluations = 12, .restart = 1}, "Population_Size = 12");
+    RunningProgram interrupted({setup_});
+    ASSERT_TRUE(waitUntil([&] { return occurrences(folder_.read("calls"), "\n") > 5; }));
+    end(interrupted);
+    EXPECT_EQ(interrupted.wait().exitCode, exitCode);
+    std::filesystem::remove(folder_ / "wait");
+  };
+  const std::vector<std::string> objectives{"fit", "other"};
+  endAfterFive([this](const RunningProgram&) { folder_.write("basin._kill_", ""); }, 1);
+  const ReadTable rows = readDataTable(folder_.read("basin_Optimisation.dat"));
+  EXPECT_EQ(rows.rows.size(), 5U);
+  EXPECT_THAT(front().headLines, Contains("Unfinished run: statistics of 5 of 12 evaluations"));
+  EXPECT_EQ(numbersOnFront(front()), numbersByComparison(rows, objectives));
+
+  removeResults();
+  endAfterFive([](const RunningProgram& run) { run.send(SIGTERM); }, 128 + SIGTERM);
+  EXPECT_FALSE(folder_.exists("basin_Pareto.dat"));
+  const auto report = [&] {
+    EXPECT_EQ(RunningProgram({setup_}, {}, MIREVO_REPORT).wait().exitCode, 0);
+    return folder_.read("basin_Report.html");
+  };
+  const std::string note = "No front was written, as the run was not finished. Started again";
+  EXPECT_THAT(report(), HasSubstr(note));
+  run();
+  EXPECT_EQ(front().rows.size(), 12U);
+  EXPECT_THAT(report(), Not(HasSubstr(note)));
+}
+
 TEST_F(Pareto, ASearchThatItsHypervolumeHasEndedLeavesNothingOpenAndGoesOnWithARaisedBudget) {
   const std::pair<const char*, const char*> cases[] = {
       {"NSGA-II", "Population_Size = 12\nHypervolume_Evaluations = 24\nHypervolume_Change = 0.3"},

@@ -68,43 +68,52 @@ class Repeated : public ::testing::Test {
   std::string setup_;
 };
 
-TEST_F(Repeated, AnyNumberOfSlotsOrRanksMakesTheSameFiles) {
-  const std::tuple<RunSettings, std::string, std::vector<int>, int> cases[] = {
-      {{.maxEvaluations = 10}, kInSideBySideOrder, {2, 3}, 4},
-      {{.algorithm = 0, .includesInitial = false, .aggregation = 1, .maxEvaluations = 16}, kInSideBySideOrder, {3}, 0},
-      {{.search = "PDDS", .maxEvaluations = 12}, kInSideBySideOrder, {4}, 0},
-      {{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 30}, kInSideBySideOrder, {3}, 0},
-      {{.algorithm = 1, .maxEvaluations = 14}, "", {3}, 3},
-      {{.search = "NSGA-II", .maxEvaluations = 20}, kInSideBySideOrder, {3}, 0},
-      {{.search = "PADDS", .maxEvaluations = 14}, kInSideBySideOrder, {4}, 0},
-      {{.search = "GLM", .maxEvaluations = 16}, kInSideBySideOrder, {3}, 0},
+TEST_F(Repeated, AnyNumberOfSlotsMakesTheSameFiles) {
+  const std::tuple<RunSettings, int, int> cases[] = {
+      {{.maxEvaluations = 8}, 3, 3},
+      {{.algorithm = 0, .includesInitial = false, .aggregation = 1, .maxEvaluations = 14}, 2, 3},
+      {{.search = "PDDS", .maxEvaluations = 8}, 3, 4},
+      {{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 26}, 2, 3},
+      {{.search = "NSGA-II", .maxEvaluations = 12}, 2, 3},
+      {{.search = "PADDS", .maxEvaluations = 10}, 2, 4},
+      {{.search = "GLM", .maxEvaluations = 12}, 2, 3},
   };
   folder_.useScript(kSleepByParameters);
-  for (auto [settings, order, slots, processes] : cases) {
-    SCOPED_TRACE(::testing::Message() << settings.algorithm << settings.search << order);
+  for (auto [settings, count, slots] : cases) {
+    SCOPED_TRACE(::testing::Message() << settings.algorithm << settings.search);
+    removeResults();
+    writeSetup(settings, count, kInSideBySideOrder);
+    runToEnd();
+    const auto expected = results();
+    EXPECT_EQ(std::ssize(table().rows), count);
+    settings.slots = slots;
+    writeSetup(settings, count, kInSideBySideOrder);
+    runToEnd();
+    EXPECT_EQ(results(), expected);
+  }
+}
+
+TEST_F(Repeated, AnyNumberOfRanksMakesTheSameFiles) {
+  if (!mpirunIsInstalled()) GTEST_SKIP() << "no mpirun";
+  folder_.useScript(kSleepByParameters);
+  for (const auto& [settings, order, processes] :
+       {std::tuple(RunSettings{.maxEvaluations = 8}, std::string(kInSideBySideOrder), 4),
+        {RunSettings{.algorithm = 1, .maxEvaluations = 12}, "", 3}}) {
     removeResults();
     writeSetup(settings, 3, order);
     runToEnd();
     const auto expected = results();
-    EXPECT_EQ(table().rows.size(), 3U);
-    for (const int count : slots) {
-      settings.slots = count;
-      writeSetup(settings, 3, order);
-      runToEnd();
-      EXPECT_EQ(results(), expected) << count;
-    }
-    if (processes == 0 || !mpirunIsInstalled()) continue;
     runToEnd(processes);
-    EXPECT_EQ(results(), expected) << processes << " processes";
+    EXPECT_EQ(results(), expected) << processes;
   }
 }
 
 TEST_F(Repeated, ARunThatWasCutOffAnywhereGoesOnToTheSameFiles) {
   for (const RunSettings& settings :
-       {RunSettings{.algorithm = 0, .includesInitial = false, .maxEvaluations = 20, .restart = 1},
-        {.search = "NSGA-II", .maxEvaluations = 20, .restart = 1},
-        {.search = "PADDS", .maxEvaluations = 20, .restart = 1},
-        {.search = "GLM", .maxEvaluations = 20, .restart = 1}}) {
+       {RunSettings{.algorithm = 0, .includesInitial = false, .maxEvaluations = 14, .restart = 1},
+        {.search = "NSGA-II", .maxEvaluations = 14, .restart = 1},
+        {.search = "PADDS", .maxEvaluations = 14, .restart = 1},
+        {.search = "GLM", .maxEvaluations = 14, .restart = 1}}) {
     for (const std::string order : {"", kInSideBySideOrder}) {
       SCOPED_TRACE(settings.search + order);
       removeResults();
@@ -113,8 +122,8 @@ TEST_F(Repeated, ARunThatWasCutOffAnywhereGoesOnToTheSameFiles) {
       const auto expected = results();
       EXPECT_EQ(expected.size(), findsFront(settings) ? 6U : settings.search == "GLM" ? 4U : 3U);
       const std::string rows = folder_.read(kResults);
-      for (const char* last : {"\n34\t", "\n5\t", "\n21\t", "\n50\t"}) {
-        if (!settings.search.empty() && std::string_view(last) != "\n34\t") continue;
+      for (const char* last : {"\n24\t", "\n5\t", "\n15\t", "\n36\t"}) {
+        if (!settings.search.empty() && std::string_view(last) != "\n24\t") continue;
         folder_.write(kResults, rows.substr(0, rows.find(last) + 9));
         runToEnd();
         EXPECT_EQ(results(), expected) << last;
@@ -163,12 +172,27 @@ TEST_F(Repeated, TheLimitsOfGlmAreThoseOfTheBestRepetition) {
   EXPECT_GT(whose.size(), 1U);
 }
 
+TEST_F(Repeated, ThoseOfGlmThatStartFromTheSameSetAreOneSearch) {
+  folder_.useScript("true");
+  writeSetup({.search = "GLM", .maxEvaluations = 12}, 3, "");
+  folder_.editSetup("Starts = 2", "Starts = 1");
+  folder_.editSetup("Initial_Value = 4.0", "Initial_Value = 4.9");
+  folder_.editSetup("Initial_Value = 1.0", "Initial_Value = 1.9");
+  runToEnd();
+  const std::string warning = "Warning: Repetitions 1, 2 and 3 started from the same sets and are the same search";
+  EXPECT_THAT(log(), AllOf(HasSubstr(warning), HasSubstr("With a single search there is nothing to compare"),
+                           Not(HasSubstr("Whatever the seed"))));
+  EXPECT_EQ(occurrences(log(), warning), 1);
+  const ReadTable found = table();
+  for (std::size_t i = 0; i < 3; ++i) EXPECT_EQ(found.rows.at(i)[found.column("Same_As").value()], i == 0 ? "0" : "1");
+  EXPECT_THAT(folder_.read("basin_Report.html"), HasSubstr(R"("sameAs":1)"));
+}
+
 TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
-  const RunSettings settings{.algorithm = 1, .maxEvaluations = 20, .restart = 1};
-  const RunSettings ofFronts{.search = "PADDS", .maxEvaluations = 20, .restart = 1};
-  for (const auto& [of, before, cutAt] :
-       {std::tuple(ofFronts, 1, ""), std::tuple(ofFronts, 2, "\n25\t"), std::tuple(settings, 1, ""),
-        std::tuple(settings, 2, ""), std::tuple(settings, 2, "\n25\t")}) {
+  const RunSettings settings{.algorithm = 1, .maxEvaluations = 14, .restart = 1};
+  const RunSettings ofFronts{.search = "PADDS", .maxEvaluations = 14, .restart = 1};
+  for (const auto& [of, before, cutAt] : {std::tuple(ofFronts, 1, ""), std::tuple(ofFronts, 2, "\n17\t"),
+                                          std::tuple(settings, 1, ""), std::tuple(settings, 2, "")}) {
     removeResults();
     writeSetup(of, before, "");
     runToEnd();
@@ -185,7 +209,7 @@ TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
   RunSettings raised = settings;
   raised.maxEvaluations = 30;
   const std::tuple<RunSettings, int, std::string, const char*> refused[] = {
-      {raised, 3, "", "Max_No_Evaluations: 20 then, 30 now: it holds for each of 3 repetitions"},
+      {raised, 3, "", "Max_No_Evaluations: 14 then, 30 now: it holds for each of 3 repetitions"},
       {settings, 2, "", "Repetitions of OPTIMISATION_ALGORITHM: 3 then, 2 now"},
       {settings, 4, kInSideBySideOrder, "Repetition_Order of OPTIMISATION_ALGORITHM: absent then, 'side by side' now"}};
   const auto before = results();
@@ -200,7 +224,10 @@ TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
   runToEnd();
   writeSetup(settings, 3, kInSideBySideOrder);
   EXPECT_EQ(run().exitCode, 1);
-  EXPECT_THAT(log(), HasSubstr("Repetitions of OPTIMISATION_ALGORITHM: 2 then, 3 now"));
+  EXPECT_THAT(log(), HasSubstr("Repetitions of OPTIMISATION_ALGORITHM: 2 then, 3 now\nRepetitions side by side take "
+                               "turns: evaluations of further ones would have stood among those that were made. "
+                               "Repetitions = 2 goes on with the earlier run; a copy of the setup under another name, "
+                               "with Repetitions = 1 and Random_Seed = 3, makes the further ones.\n"));
 }
 
 TEST_F(Repeated, WhatEndsARunLeavesTheRepetitionsAsFarAsTheyHadCome) {
@@ -257,6 +284,21 @@ TEST_F(Repeated, WhatEndsARunLeavesTheRepetitionsAsFarAsTheyHadCome) {
       }
     }
   }
+}
+
+TEST_F(Repeated, TheReportOfARunThatASignalEndedSaysWhyItHasNone) {
+  folder_.useScript("echo >>../calls; while test $(wc -l <../calls) -gt 5; do sleep 0.05; done");
+  writeSetup({.maxEvaluations = 4}, 2, "");
+  const auto report = [&] {
+    EXPECT_EQ(RunningProgram({setup_}, {}, MIREVO_REPORT).wait().exitCode, 0);
+    return folder_.read("basin_Report.html");
+  };
+  RunningProgram program({setup_});
+  ASSERT_TRUE(waitUntil([&] { return occurrences(folder_.read("calls"), "\n") > 5; }));
+  EXPECT_THAT(report(), HasSubstr("There is no table of the repetitions yet"));
+  program.send(SIGTERM);
+  EXPECT_EQ(program.wait().exitCode, 128 + SIGTERM);
+  EXPECT_THAT(report(), HasSubstr("No table of the repetitions was written, as the run was not finished. Started"));
 }
 
 TEST_F(Repeated, ASetupIsCheckedWithItsRepetitions) {

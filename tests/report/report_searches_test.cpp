@@ -221,6 +221,23 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   EXPECT_THAT(ofFronts->parameters, ElementsAre("a", "b # c"));
   EXPECT_EQ(ofFronts->all[1].parameters[1], 1.0 / 3.0);
 
+  // The same search as an earlier one, of parameters with names of columns.
+  DataTable same = table;
+  same.columns = {"Repetition",      "Seed",    "Evaluations", "Best_Evaluation", "Aggregate",  "Loops",
+                  "Start_Aggregate", "Same_As", "Seed (2)",    "Termination (2)", "Termination"};
+  same.rows[0][7] = std::int64_t{0};
+  same.rows[1][7] = std::int64_t{1};
+  write(run_files::kRepetitions, dataTableText(same));
+  const auto twice = repetitions();
+  ASSERT_TRUE(twice);
+  EXPECT_THAT(twice->parameters, ElementsAre("Seed (2)", "Termination (2)"));
+  EXPECT_EQ(twice->all[0].seed, 5);
+  EXPECT_EQ(twice->all[0].parameters[1], 1.0 / 3.0);
+  JsonWriter ofSame;
+  ofSame.beginObject();
+  writeRepetitions(ofSame, *twice);
+  EXPECT_THAT(ofSame.endObject().take(), AllOf(HasSubstr(R"("start":9.5,"sameAs":1,)"), Not(HasSubstr("sameAs\":0"))));
+
   // One of an unfinished run that has not ended, with the least value, is not what others are judged by.
   table.rows.push_back(row(3, 0.01));
   table.rows.back().insert(table.rows.back().begin() + 7, 0.0);

@@ -106,10 +106,10 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
   };
   std::vector<std::string> lines;
   lines.push_back(fmt::format(
-      "Course: in the second half of the evaluations the hypervolume {}, in the last tenth it {}; the last set to join "
-      "the front was {}evaluation {} of {}",
-      riseText(half, end), riseText(tenth, end), isRepetition ? "its " : "", archive.entries().back().evaluation,
-      count));
+      "{}: in the second half of the evaluations the hypervolume {}, in the last tenth it {}; the last set to join the "
+      "front was {}evaluation {} of {}",
+      isRepetition ? "Course over the evaluations of this repetition" : "Course", riseText(half, end),
+      riseText(tenth, end), isRepetition ? "its " : "", archive.entries().back().evaluation, count));
   const std::string_view others = isRepetition ? "the other repetitions" : "other values of Random_Seed";
   if (!isBudgetUsed) {
     lines.push_back(fmt::format(

@@ -59,18 +59,20 @@ std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed
   const double half = course.bestAfter(0.5 * count);
   const double tenth = course.bestAfter(0.9 * count);
   std::vector<std::string> lines;
+  const std::string_view heading = isRepetition ? "Course over the evaluations of this repetition" : "Course";
   const std::string found = fmt::format("found by {}evaluation {} of {}", isRepetition ? "its " : "",
                                         course.steps().back().evaluation, count);
   const std::string_view others = isRepetition ? "the other repetitions" : "other values of Random_Seed";
   if (half >= kFailedRunValue) {
-    lines.push_back(
-        fmt::format("Course: the best value, {}, was {}; none of the first half succeeded", formatReal(best), found));
+    lines.push_back(fmt::format("{}: the best value, {}, was {}; none of the first half succeeded", heading,
+                                formatReal(best), found));
   } else if (half == best) {
-    lines.push_back(fmt::format("Course: the best value, {}, was {}; the second half found no better one",
+    lines.push_back(fmt::format("{}: the best value, {}, was {}; the second half found no better one", heading,
                                 formatReal(best), found));
   } else {
     lines.push_back(fmt::format(
-        "Course: in the second half of the evaluations the best value fell {}, {}; it was {}", fallText(half, best),
+        "{}: in the second half of the evaluations the best value fell {}, {}; it was {}", heading,
+        fallText(half, best),
         tenth == best ? std::string("in the last tenth it did not") : "in the last tenth " + fallText(tenth, best),
         found));
   }

@@ -140,6 +140,7 @@ void Glm::startNext() {
   current_ = std::move(starts_.front());
   leastOfRuns_ = std::min(leastOfRuns_, current_->sum);
   starts_.pop_front();
+  summary_.starts.push_back(current_->set);
   jacobian_.clear();
   differences_.reset();
   needsJacobian_ = true;

@@ -5,7 +5,7 @@
 #include <iterator>
 #include <utility>
 
-#include <fmt/core.h>
+#include <fmt/format.h>
 
 #include "algorithms/numbers/sample_summary.h"
 #include "common/rounded_text.h"
@@ -192,17 +192,45 @@ class SpreadText final {
 
 }  // namespace
 
+std::string sameSearchesText(std::span<const Repetition> repetitions) {
+  const std::vector<int> same = sameSearches(repetitions);
+  std::string groups;
+  for (std::size_t first = 0; first < same.size(); ++first) {
+    std::vector<std::size_t> numbers{first + 1};
+    for (std::size_t i = first + 1; i < same.size(); ++i) {
+      if (same[i] == static_cast<int>(first) + 1) numbers.push_back(i + 1);
+    }
+    if (numbers.size() == 1) continue;
+    const std::size_t last = numbers.back();
+    numbers.pop_back();
+    groups += fmt::format("{} {} and {}", groups.empty() ? "Repetitions" : ", and", fmt::join(numbers, ", "), last);
+  }
+  if (groups.empty()) return {};
+  return fmt::format(
+      "{} started from the same sets and are the same search, which counts once in what is said of all. For other "
+      "starts: a larger sample (Sample_Size), more of its sets (Starts), or Include_Initial_Parameters = 0 where it is "
+      "the initial one",
+      groups);
+}
+
 std::vector<std::string> repetitionLines(std::span<const Repetition> repetitions, const SearchSpace& space,
                                          std::span<const std::string> objectives, std::int32_t planned) {
   if (std::ranges::any_of(repetitions, [](const Repetition& one) { return one.front.has_value(); })) {
     return repeatedFrontLines(repetitions, space, objectives, planned);
   }
   std::vector<std::string> lines = tableLines(repetitions, planned);
+  const std::string sameText = sameSearchesText(repetitions);
+  if (!sameText.empty()) lines.push_back("Warning: " + sameText);
+  const std::vector<int> same = sameSearches(repetitions);
   std::vector<const Repetition*> ended;
-  for (const Repetition& repetition : repetitions) {
-    if (!repetition.termination.empty() && repetition.bestEvaluation > 0) ended.push_back(&repetition);
+  for (std::size_t i = 0; i < repetitions.size(); ++i) {
+    const Repetition& repetition = repetitions[i];
+    if (!repetition.termination.empty() && repetition.bestEvaluation > 0 && same[i] == 0) ended.push_back(&repetition);
   }
-  if (ended.size() < 2) return lines;
+  if (ended.size() < 2) {
+    if (!sameText.empty() && !ended.empty()) lines.emplace_back("With a single search there is nothing to compare");
+    return lines;
+  }
   const std::vector<std::string> spread = SpreadText(std::move(ended), space).lines();
   lines.insert(lines.end(), spread.begin(), spread.end());
   return lines;

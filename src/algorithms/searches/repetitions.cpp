@@ -9,6 +9,7 @@
 
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/uniform_generator.h"
+#include "common/column_heading.h"
 #include "common/rounded_text.h"
 #include "common/run_files.h"
 
@@ -19,6 +20,18 @@ std::int32_t repetitionSeed(std::int32_t seed, std::int32_t index) {
   std::int64_t size = std::abs(std::int64_t{seed}) + index;
   if (index > 0 && size > kLargest) size -= UniformGenerator::kSeedPeriod;
   return static_cast<std::int32_t>(seed < 0 ? -size : size);
+}
+
+std::vector<int> sameSearches(std::span<const Repetition> repetitions) {
+  std::vector<int> same(repetitions.size(), 0);
+  for (std::size_t i = 0; i < repetitions.size(); ++i) {
+    const std::vector<ParameterSet>& starts = repetitions[i].starts;
+    if (starts.empty()) continue;
+    const auto before = repetitions.first(i);
+    const auto first = std::ranges::find(before, starts, &Repetition::starts);
+    if (first != before.end()) same[i] = static_cast<int>(first - before.begin()) + 1;
+  }
+  return same;
 }
 
 std::string seedsText(std::int32_t seed, std::int32_t count) {
@@ -55,12 +68,25 @@ DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchS
         "of its front, as a share of the box between that point and the reference point");
     table.columns.emplace_back("Hypervolume");
   }
-  table.columns.insert(table.columns.end(), space.names.begin(), space.names.end());
-  table.columns.emplace_back("Termination");
-  std::int64_t number = 0;
-  for (const Repetition& repetition : repetitions) {
+  const std::vector<int> same = sameSearches(repetitions);
+  const bool hasSame = std::ranges::any_of(same, [](int other) { return other != 0; });
+  if (hasSame) {
+    table.headLines.emplace_back(
+        "Same_As: the earlier repetition that started from the same sets and thus is the same search; 0: none");
+    table.columns.emplace_back("Same_As");
+  }
+  const std::string lastColumn = "Termination";
+  std::vector<std::string> taken = table.columns;
+  taken.push_back(lastColumn);
+  for (const std::string& name : space.names) {
+    table.columns.push_back(columnHeading(name, taken));
+    taken.push_back(table.columns.back());
+  }
+  table.columns.push_back(lastColumn);
+  for (std::size_t i = 0; i < repetitions.size(); ++i) {
+    const Repetition& repetition = repetitions[i];
     std::vector<DataTable::Cell>& row = table.rows.emplace_back();
-    row = {++number,
+    row = {static_cast<std::int64_t>(i + 1),
            std::int64_t{repetition.seed},
            std::int64_t{repetition.evaluations},
            std::int64_t{repetition.bestEvaluation},
@@ -68,6 +94,7 @@ DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchS
            std::int64_t{repetition.loops},
            repetition.startAggregate};
     if (hasFronts) row.emplace_back(repetition.front ? repetition.front->hypervolume : 0.0);
+    if (hasSame) row.emplace_back(std::int64_t{same[i]});
     for (std::size_t k = 0; k < space.size(); ++k) {
       row.emplace_back(repetition.best.empty() ? std::numeric_limits<double>::quiet_NaN()
                                                : toModelScale(space, k, repetition.best[k]));

@@ -61,7 +61,15 @@ struct Repetition {
   double startAggregate = std::numeric_limits<double>::quiet_NaN();
   ParameterSet start = {};                    ///< with it; search scale
   std::optional<RepetitionFront> front = {};  ///< of a search that finds one
+  /// Of one that has ended and drew no random numbers behind its sample: SearchSummary::starts.
+  std::vector<ParameterSet> starts = {};
 };
+
+/// For each the number of the earlier repetition that started from the same sets and that was the same search from
+/// there on; 0 if there is none.
+std::vector<int> sameSearches(std::span<const Repetition> repetitions);
+/// "Repetitions 1, 3 and 4 started from the same sets ...", of all groups; empty if there are none.
+std::string sameSearchesText(std::span<const Repetition> repetitions);
 
 /// Successive evaluations of one repetition, all of these numbers.
 struct RepetitionStretch {

@@ -31,6 +31,9 @@ struct SearchSummary {
   std::string terminationMessage;  ///< empty while it runs
   int finalRunOf = 0;              ///< the evaluation whose set the final model run repeats; 0: the best
   std::vector<std::string> notes;  ///< what the log should say of its course, one line each
+  /// Search scale; of a search that draws nothing once it has its sample, the sets from which it went on: another that
+  /// goes on from the same ones is the same search. Empty of the others.
+  std::vector<ParameterSet> starts;
 };
 
 /// A search in steps: initialise() once, then advance() until isTerminated().

@@ -292,6 +292,7 @@ export interface Repetition {
   loops: number;
   start: Maybe; // the least aggregate with which it began
   hypervolume?: Maybe; // of its front, on the scale of that of all
+  sameAs?: number; // an earlier one that started from the same sets and is the same search
   parameters: Maybe[]; // of its best set; of a front, of its compromise
   termination: string;
 }

@@ -79,6 +79,7 @@ void requireSameSettings(const RestartSettings& then, const RestartSettings& now
   std::string detail = "the setup is another one than that of the earlier run:";
   for (std::size_t i = 0; i < std::min(changes.size(), kMostChangesShown); ++i) detail += "\n   " + changes[i];
   if (changes.size() > kMostChangesShown) detail += fmt::format("\n   and {} more", changes.size() - kMostChangesShown);
+  if (const std::string remedy = repetitionsRemedy(then, now); !remedy.empty()) detail += "\n" + remedy;
   refuse(detail);
 }
 

@@ -30,6 +30,7 @@ constexpr std::string_view kSettingLine = "Setting";
 constexpr std::string_view kFileLine = "File";
 constexpr std::string_view kSearchLine = "Search";
 constexpr std::string_view kLastLine = "End";
+constexpr std::string_view kSeedKeyword = "Random_Seed";
 
 bool namesAFileOfResults(const ResultSetting& setting) {
   return setting.keyword == "BatchFileName" || setting.keyword == "TemplateFileName" ||
@@ -127,14 +128,17 @@ bool isBudget(const RestartSettings& settings, const ResultSetting& setting) {
   });
 }
 
+bool areSideBySide(const RestartSettings& settings) {
+  return std::ranges::any_of(settings.settings, [](const ResultSetting& setting) {
+    return setting.keyword == kRepetitionOrderKeyword &&
+           setting.value == fmt::format("'{}'", repetitionOrderNames()[1].name);
+  });
+}
+
 /// Whether further repetitions of a search follow those that were to be made; where they go on side by side, they would
 /// stand among them.
 bool addsRepetitions(const RestartSettings& then, const RestartSettings& now) {
-  return searchRepetitions(now) > searchRepetitions(then) &&
-         std::ranges::none_of(now.settings, [](const ResultSetting& setting) {
-           return setting.keyword == kRepetitionOrderKeyword &&
-                  setting.value == fmt::format("'{}'", repetitionOrderNames()[1].name);
-         });
+  return searchRepetitions(now) > searchRepetitions(then) && !areSideBySide(now);
 }
 
 std::string_view withoutQuotes(std::string_view value) {
@@ -235,6 +239,27 @@ int searchRepetitions(const RestartSettings& settings) {
     if (setting.keyword == kRepetitionsKeyword) return parseInteger(setting.value).value_or(1);
   }
   return 1;
+}
+
+std::string repetitionsRemedy(const RestartSettings& then, const RestartSettings& now) {
+  const int before = searchRepetitions(then);
+  const std::int64_t further = std::int64_t{searchRepetitions(now)} - before;
+  if (further <= 0 || !areSideBySide(now)) return {};
+  std::string text =
+      "Repetitions side by side take turns: evaluations of further ones would have stood among those that were made. ";
+  if (!areSideBySide(then)) {
+    return text + fmt::format("{} = '{}' lets them follow the earlier ones.", kRepetitionOrderKeyword,
+                              repetitionOrderNames()[0].name);
+  }
+  std::int32_t seed = 1;
+  for (const ResultSetting& setting : then.settings) {
+    if (setting.keyword == kSeedKeyword) seed = parseInteger(setting.value).value_or(seed);
+  }
+  return text +
+         fmt::format(
+             "{0} = {1} goes on with the earlier run; a copy of the setup under another name, with {0} = {2} and "
+             "{3} = {4}, makes the further ones.",
+             kRepetitionsKeyword, before, further, kSeedKeyword, repetitionSeed(seed, before));
 }
 
 std::vector<std::string> changedSettings(const RestartSettings& then, const RestartSettings& now) {

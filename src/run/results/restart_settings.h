@@ -43,6 +43,10 @@ bool isLaterVersion(std::string_view version);
 /// (`Max_No_Evaluations`) is not a change.
 std::vector<std::string> changedSettings(const RestartSettings& then, const RestartSettings& now);
 
+/// Why repetitions of a search cannot be added where they go on side by side, and what to do instead; empty if none
+/// are.
+std::string repetitionsRemedy(const RestartSettings& then, const RestartSettings& now);
+
 /// The budget of a search or of Markov chains; empty for another task.
 std::optional<int> searchBudget(const RestartSettings& settings);
 /// The number of its repetitions; 1 of one that is not repeated.

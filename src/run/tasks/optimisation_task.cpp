@@ -332,6 +332,7 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
     }
   }
   SearchSummary summary = searchAll(context);
+  hasSearched_ = true;
   TaskOutcome outcome{summary.terminationMessage};
   if (repeated_) {
     repeated_->addResults(context, referencePoint(), outcome);
@@ -359,10 +360,15 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
 std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext& context,
                                                                const UnfinishedBatch& made) const {
   std::optional<std::size_t> fitted = fittedRepetition(nullptr);
-  if (!repeated_ && !fitted && !(front_ && front_->hasFront())) return std::nullopt;
-  TaskOutcome outcome{std::string(kEndOfTask)};
   std::optional<FrontFinding> front;
   if (front_) front.emplace(*front_);
+  if (front && !repeated_ && !hasSearched_) {  // what the search has not taken belongs to its front, too
+    for (std::size_t i = 0; i < made.results.size(); ++i) {
+      addToArchive(front->problem().archive, made.sets[i], made.results[i]);
+    }
+  }
+  if (!repeated_ && !fitted && !(front && front->hasFront())) return std::nullopt;
+  TaskOutcome outcome{std::string(kEndOfTask)};
   if (repeated_) {
     RepeatedSearch all = *repeated_;
     all.takeUnfinished(context, made, front ? &front->problem().archive : nullptr);
@@ -380,7 +386,7 @@ std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext
 
 std::optional<int> OptimisationTask::unfinishedEvaluations(const UnfinishedBatch& made) const {
   if (repeated_) return repeated_->evaluationCountWith(made);
-  if (front_) return front_->evaluationCount();
+  if (front_) return front_->evaluationCount() + (hasSearched_ ? 0 : static_cast<int>(made.results.size()));
   const std::optional<std::size_t> fitted = fittedRepetition(nullptr);
   return fitted ? fittings_[*fitted]->problem().evaluationCount : 0;
 }

@@ -99,6 +99,7 @@ class OptimisationTask final : public Task {
   std::optional<RepeatedSearch> repeated_;  ///< once it runs
   std::unique_ptr<FrontFinding> front_;     ///< of a search for a front, once it runs; of repetitions that of all
   bool keepsFrontSeries_ = false;
+  bool hasSearched_ = false;  ///< what follows is the final model run
 };
 
 }  // namespace mirevo

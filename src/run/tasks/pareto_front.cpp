@@ -10,6 +10,7 @@
 #include "algorithms/pareto/dominance.h"
 #include "algorithms/pareto/front_scale.h"
 #include "common/calendar.h"
+#include "common/column_heading.h"
 #include "common/text.h"
 #include "common/version.h"
 #include "measures/dates.h"
@@ -30,13 +31,6 @@ struct FrontRow {
   int rank = 1;
   double crowding = 0.0;
 };
-
-std::string heading(const std::string& name, std::span<const std::string> columns) {
-  const std::string plain = columnName(name);
-  std::string unique = plain;
-  for (int i = 2; std::ranges::find(columns, unique) != columns.end(); ++i) unique = fmt::format("{} ({})", plain, i);
-  return unique;
-}
 
 /// The front, and the members of the last population that are behind it. A member that nothing on the front dominates
 /// is on it, itself or one with equal values.
@@ -169,9 +163,9 @@ DataTable FrontFinding::frontTable(const TaskContext& context) const {
       "front. It is a suggestion"};
   table.columns = {"Evaluation", "Rank", "Crowding", "Violation", "Suggested", "Distance"};
   for (const ObjectiveFunction& objective : context.objectives) {
-    table.columns.push_back(heading(objective.name, table.columns));
+    table.columns.push_back(columnHeading(objective.name, table.columns));
   }
-  for (const std::string& name : context.space.names) table.columns.push_back(heading(name, table.columns));
+  for (const std::string& name : context.space.names) table.columns.push_back(columnHeading(name, table.columns));
   const FrontScale scale(problem_.archive.points());
   const FrontMember* const chosen = suggested();
   for (const FrontRow& row : rowsOf(problem_)) {

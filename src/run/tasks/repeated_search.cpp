@@ -270,6 +270,7 @@ void RepeatedSearch::end(std::size_t index, const SearchSummary& summary) {
   Repetition& own = repetitions_[index];
   own.loops = summary.loopCount;
   own.termination = summary.terminationMessage;
+  own.starts = summary.starts;
   if (summary.bestResult.ok() && !summary.best.empty()) {
     // The search knows which of several equal evaluations it took.
     own.bestEvaluation = summary.bestResult.number;

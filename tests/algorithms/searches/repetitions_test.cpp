@@ -136,6 +136,47 @@ TEST(Repetitions, ThatTheyHaveTheirStartInCommonIsNoMinimumThatAllHaveFound) {
   EXPECT_THAT(spreadText(all), HasSubstr("\n2 of 3 repetitions found nothing better than what they began with\n"));
 }
 
+TEST(Repetitions, ThoseThatStartedFromTheSameSetsCountOnce) {
+  std::vector<Repetition> all = repetitionsOf({{2.0, {1.0, 0.0}},
+                                               {3.0, {4.0, 0.1}},
+                                               {2.0, {1.0, 0.0}},
+                                               {2.0, {1.0, 0.0}},
+                                               {3.0, {4.0, 0.1}},
+                                               {2.5, {2.0, 0.1}}});
+  const std::vector<ParameterSet> first{{1.5, 0.5}, {2.5, 0.5}};
+  const std::vector<ParameterSet> second{{1.5, 0.5}};
+  for (const std::size_t i : {0U, 2U, 3U}) all[i].starts = first;
+  for (const std::size_t i : {1U, 4U}) all[i].starts = second;
+  EXPECT_THAT(sameSearches(all), ElementsAre(0, 0, 1, 1, 2, 0)) << "one that tells no starts is no other's search";
+  const std::string text = spreadText(all);
+  EXPECT_THAT(text, HasSubstr("\nWarning: Repetitions 1, 3 and 4, and 2 and 5 started from the same sets and are the "
+                              "same search, which counts once"));
+  EXPECT_THAT(text, HasSubstr("least 2, median 2.5, greatest 3; 1 of 3 repetitions ended within 1 %"));
+  const DataTable table = repetitionTable(all, repeatedSpace());
+  EXPECT_EQ(table.columns[7], "Same_As");
+  EXPECT_EQ(table.rows[4][7], DataTable::Cell(std::int64_t{2}));
+
+  all.resize(1);
+  all.push_back(all[0]);
+  EXPECT_THAT(spreadText(all), AllOf(EndsWith("\nWith a single search there is nothing to compare\n"),
+                                     Not(HasSubstr("Whatever the seed"))));
+}
+
+TEST(Repetitions, AParameterWithTheNameOfAColumnHasAHeadingOfItsOwn) {
+  SearchSpace space = repeatedSpace();
+  for (const auto& [names, headings] :
+       {std::pair<std::vector<std::string>, std::vector<std::string>>({"Seed", "Termination"},
+                                                                      {"Seed (2)", "Termination (2)"}),
+        {{"Start_Aggregate", "Start_Aggregate (2)"}, {"Start_Aggregate (2)", "Start_Aggregate (2) (2)"}},
+        {{" a\tb", "a b"}, {"a b", "a b (2)"}}}) {
+    space.names = names;
+    std::vector<std::string> columns = repetitionTable(repetitionsOf({{2.0, {1.0, 0.0}}}), space).columns;
+    EXPECT_EQ(std::vector(columns.end() - 3, columns.end() - 1), headings);
+    EXPECT_EQ(columns.back(), "Termination");
+    EXPECT_EQ(std::set(columns.begin(), columns.end()).size(), columns.size());
+  }
+}
+
 TEST(Repetitions, AnIntegerParameterTakesUpWhatItsRunsHad) {
   SearchSpace space = repeatedSpace();
   space.upper[0] = 5.0;  // whole numbers from 0 to 4

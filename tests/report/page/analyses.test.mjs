@@ -194,7 +194,12 @@ test('repetitions that have not ended, or have no result, are told of and not co
     Object.assign(data.repetitions.all[2], { best: 0, aggregate: null, ...(data.repetitions.all[2].hypervolume ? { hypervolume: 0 } : {}) });
     return data;
   };
+  const withSame = (data) => {
+    data.repetitions.all[1].sameAs = 1;
+    return data;
+  };
   for (const [data, texts] of [
+    [withSame(sample.withTables(2)), ['The best aggregates of 2 repetitions', '1 of 2 repetitions ended within', 'Repetition 2 is the same search as 1: they started from the same sets, and count once']],
     [cut(sample.withTables(2)), ['The best aggregates of 1 repetition', '1 repetition found no value.', '1 repetition had not ended.']],
     [cut(sample.withTables(4)), ['the fronts of the 1 that has ended with one, on its scale: least 1.5, median 1.5, greatest 1.5', '1 repetition found no front.', '1 repetition had not ended.']]]) {
     await withReport(data, {}, async (page) => {

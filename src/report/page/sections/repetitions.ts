@@ -14,8 +14,10 @@ const kMostRows = 60; // with a name each
 const kMostLines = 40;
 
 const nameOf = ({ seed, number: of }: Repetition) => `repetition ${of} (seed ${seed})`;
-/** Those that have ended with a best set, or a front: as in the log, the others are told of, but not compared. */
-const compared = (all: readonly Repetition[]) => all.filter(({ best, termination, aggregate, hypervolume }) => best > 0 && termination !== '' && (aggregate !== null || hypervolume != null));
+/** Those that have ended with a best set, or a front. */
+const endedOf = (all: readonly Repetition[]) => all.filter(({ best, termination, aggregate, hypervolume }) => best > 0 && termination !== '' && (aggregate !== null || hypervolume != null));
+/** The same search counts once; as in the log, the others are told of, but not compared. */
+const compared = (all: readonly Repetition[]) => endedOf(all).filter(({ sameAs }) => !sameAs);
 const least = (all: readonly Repetition[]) => finite(all.map(({ aggregate }) => aggregate)).reduce((a, b) => Math.min(a, b), Infinity);
 
 /** Whether its best value is as good as the least of all. */
@@ -47,10 +49,12 @@ function listed<Item>(items: readonly Item[], text: (item: Item) => string): str
   return `${items.slice(0, kMostNamed).map(text).join(', ')}${more > 0 ? ` and ${count(more)} more` : ''}`;
 }
 
-function othersThan(ended: readonly Repetition[], all: readonly Repetition[], what: string): Finding[] {
+function othersThan(all: readonly Repetition[], what: string): Finding[] {
   const unfinished = all.filter(({ termination }) => termination === '').length;
-  const without = all.length - ended.length - unfinished;
+  const without = all.length - endedOf(all).length - unfinished;
+  const same = all.filter(({ sameAs }) => sameAs);
   return [
+    ...(same.length > 0 ? [{ kind: 'warning' as const, text: `${listed(same, ({ number: of, sameAs }) => `Repetition ${count(of)} is the same search as ${count(sameAs!)}`)}: they started from the same sets, and count once in what is said of all. A larger sample, or more of its sets to start from, gives other starts.` }] : []),
     ...(without > 0 ? [{ kind: 'warning' as const, text: `${counted(without, 'repetition')} found no ${what}.` }] : []),
     ...(unfinished > 0 ? [{ kind: 'warning' as const, text: `${counted(unfinished, 'repetition')} had not ended.` }] : []),
   ];
@@ -59,7 +63,7 @@ function othersThan(ended: readonly Repetition[], all: readonly Repetition[], wh
 function findings(data: ReportData, repetitions: Repetitions): Finding[] {
   const ended = compared(repetitions.all);
   const values = sorted(ended.map(({ aggregate }) => aggregate));
-  const others = othersThan(ended, repetitions.all, 'value');
+  const others = othersThan(repetitions.all, 'value');
   if (values.length === 0) return others;
   const best = values[0]!;
   const near = ended.filter((one) => isNear(repetitions, one, best));
@@ -87,7 +91,7 @@ function findings(data: ReportData, repetitions: Repetitions): Finding[] {
 /** Of searches for a front: how near each comes to that of all of them. */
 function frontFindings({ front }: ReportData, { all }: Repetitions): Finding[] {
   const ended = compared(all);
-  const others = othersThan(ended, all, 'front');
+  const others = othersThan(all, 'front');
   const volumes = sorted(ended.map(({ hypervolume }) => hypervolume ?? null));
   const greatest = volumes[volumes.length - 1];
   if (greatest === undefined) return others;
