@@ -133,6 +133,13 @@ TEST(SetupCheck, SaysWhatIsWrong) {
   }
 }
 
+/// a + b must be 6 or more: the initial values are too small.
+void constrainToSix(const ModelFolder& folder) {
+  folder.editSetup("TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+                   "TqSEKdxListItemCount = 1\n[CONSTRAINT_1]\nLeft_Equation = '6'\nRight_Equation = 'a + b'\n"
+                   "Logical_Operator = 0\n[/CONSTRAINT_1]\n[/INTERNAL_CONSTRAINTS]");
+}
+
 TEST(SetupCheck, RunsASetOfTheTaskWhereInitialValuesThatItDoesWithoutCannotBeRun) {
   struct Case {
     int option;
@@ -163,9 +170,7 @@ TEST(SetupCheck, RunsASetOfTheTaskWhereInitialValuesThatItDoesWithoutCannotBeRun
     const ModelFolder folder;
     const std::string setup = folder.writeSetup({.option = each.option, .maxEvaluations = 80});
     folder.editSetup(each.from, each.to);
-    folder.editSetup("TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
-                     "TqSEKdxListItemCount = 1\n[CONSTRAINT_1]\nLeft_Equation = '6'\nRight_Equation = 'a + b'\n"
-                     "Logical_Operator = 0\n[/CONSTRAINT_1]\n[/INTERNAL_CONSTRAINTS]");
+    constrainToSix(folder);
     const FolderState before = stateOf(folder);
     const ProgramResult result = check(setup);
     const bool isFault = each.error[0] != '\0';
@@ -179,6 +184,30 @@ TEST(SetupCheck, RunsASetOfTheTaskWhereInitialValuesThatItDoesWithoutCannotBeRun
     EXPECT_FALSE(folder.exists("basin_Check_Process1"));
     EXPECT_TRUE(stateOf(folder) == before);
   }
+}
+
+TEST(SetupCheck, RunsASetOfTheSampleOfEverySearch) {
+  for (const char* search : {"SCE", "PSE", "OPSE", "DDS", "PDDS", "CMA-ES", "GLM"}) {
+    SCOPED_TRACE(search);
+    const ModelFolder folder;
+    const std::string setup = folder.writeSetup({.search = search, .includesInitial = false, .maxEvaluations = 80});
+    constrainToSix(folder);
+    const ProgramResult result = check(setup);
+    EXPECT_EQ(result.exitCode, 0) << result.error;
+    EXPECT_THAT(result.output, HasSubstr("Values of a set of the task, with which the model is run instead"));
+  }
+  // Of a sample file GLM takes six sets, which can be run, unlike those behind them.
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.search = "GLM", .includesInitial = false, .maxEvaluations = 80});
+  constrainToSix(folder);
+  std::string sample = "a b\n";
+  for (int i = 0; i < 30; ++i) sample += fmt::format("{} {}\n", i < 6 ? 4 + i : 1, i < 6 ? 4.0 : 0.1 * i);
+  folder.write("sample.txt", sample);
+  folder.editSetup("Initial_Sample_Generation = 0\n      Initial_Sample_File_Name = ''",
+                   "Initial_Sample_Generation = 4\n      Initial_Sample_File_Name = 'sample.txt'");
+  const ProgramResult result = check(setup);
+  EXPECT_EQ(result.exitCode, 0) << result.output << result.error;
+  EXPECT_THAT(result.output, Not(HasSubstr("Warning")));
 }
 
 TEST(SetupCheck, LeavesARunInProgressAloneAndHasAFolderOfItsOwn) {

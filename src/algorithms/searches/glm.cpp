@@ -176,7 +176,7 @@ void Glm::end(std::string message) {
     note(fmt::format("The estimate of {} is at its {} bound", problem_.residuals->space.names[j],
                      isAtLower ? "lower" : "upper"));
   }
-  if (best_ && best_->sum < leastOfRuns_) {
+  if (best_ && runCount_ > 0 && best_->sum < leastOfRuns_) {
     note(fmt::format(
         "The best set, evaluation {}, is one of the differences: sum of squares {}, {:.3g} % less than where "
         "the runs have come to. A search with it as the initial set goes on from there",
@@ -206,7 +206,10 @@ bool Glm::makeJacobian() {
   PerturbationPlan plan =
       planPerturbations(settings, residuals.space, current_->set, residuals.fields, problem_.feasibility);
   const std::vector<std::optional<Point>> points = run(std::span(plan.sets).subspan(1));
-  if (points.size() + 1 < plan.sets.size()) return false;
+  if (points.size() + 1 < plan.sets.size()) {
+    noteDifferences(points);
+    return false;
+  }
   std::vector<std::vector<double>> outputs{current_->rows.values};
   for (const std::optional<Point>& point : points) {
     outputs.push_back(point ? point->rows.values : std::vector<double>());
@@ -251,16 +254,21 @@ bool Glm::makeJacobian() {
   differences_ = std::move(made);
   needsJacobian_ = false;
   updates_ = 0;
-  constexpr double kNegligible = 1.0e-6;  // where a run has come to its minimum, a difference is no better
-  for (const std::optional<Point>& point : points) {
-    if (point && point->sum < (1.0 - kNegligible) * best_->sum) noteBest(*point);
-  }
+  noteDifferences(points);
   if (best_->result.number == current_->result.number) {
     ResidualFit& fit = *problem_.residuals->fit;
     fit.jacobian = differences_;
     fit.rows.units = units_;
   }
   return true;
+}
+
+/// Where a run has come to its minimum, a difference is no better.
+void Glm::noteDifferences(std::span<const std::optional<Point>> points) {
+  constexpr double kNegligible = 1.0e-6;
+  for (const std::optional<Point>& point : points) {
+    if (point && point->sum < (1.0 - kNegligible) * best_->sum) noteBest(*point);
+  }
 }
 
 /// With the rows of the prior.

@@ -72,6 +72,7 @@ class Glm final : public SearchAlgorithm {
   /// Fewer results than sets if the budget is used up.
   std::vector<std::optional<Point>> run(std::span<const ParameterSet> sets);
   bool makeJacobian();
+  void noteDifferences(std::span<const std::optional<Point>> points);
   GlmLinearModel linearModel() const;
   std::vector<double> lambdas(int attempt) const;
   std::vector<ParameterSet> trialSets(GlmLinearModel& model, std::span<const double> lambdas,

@@ -1,6 +1,7 @@
 #include "run/tasks/optimisation_task.h"
 
 #include <algorithm>
+#include <limits>
 #include <span>
 #include <utility>
 
@@ -8,6 +9,7 @@
 
 #include "algorithms/numbers/lapack_functions.h"
 #include "algorithms/pareto/front_scale.h"
+#include "algorithms/searches/residual_problem.h"
 #include "common/text.h"
 #include "measures/statistics.h"
 #include "run/tasks/analysis_names.h"
@@ -177,15 +179,14 @@ std::vector<ParameterSet> OptimisationTask::givenSets(const SearchSpace& space) 
   std::vector<ParameterSet> given;
   if (initialSample.includeInitialParameters) given.push_back(searchBounds(space).initial);
   for (ParameterSet& set : givenSample(space)) given.push_back(std::move(set));
-  const std::int64_t population = method->populationSize();
   const auto most = static_cast<std::size_t>(
-      std::min<std::int64_t>(population > 0 ? population : std::ssize(given), stopping.maxEvaluations));
+      std::min<std::int64_t>(method->sampleSize(initialSample, stopping.maxEvaluations), stopping.maxEvaluations));
   if (given.size() > most) given.resize(most);
   return given;
 }
 
 std::vector<SetDoubt> OptimisationTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
-  if (!method || !feasibility.isTested()) return {};
+  if (!method || !isSearch() || !feasibility.isTested()) return {};
   return infeasibleSets(feasibility, givenSets(space), kWhatGivenSets, stopping.maxEvaluations).doubts();
 }
 
@@ -206,6 +207,13 @@ std::vector<ParameterSet> OptimisationTask::startOf(const SearchSpace& space, co
   SearchProblem problem = problemOf(space, feasibility, evaluator, random);
   ParetoProblem pareto;
   problem.pareto = &pareto;
+  ResidualProblem residuals;  // without a model all are missing
+  residuals.space = space;
+  residuals.residualsOf = [](const EvaluationResult&) {
+    constexpr double kMissing = std::numeric_limits<double>::quiet_NaN();
+    return ResidualRows{{kMissing}, {kMissing}};
+  };
+  problem.residuals = &residuals;
   method->make(std::move(problem))->initialise();
   return evaluator.sets();
 }

@@ -18,6 +18,7 @@ namespace {
 using ::testing::DoubleNear;
 using ::testing::Each;
 using ::testing::HasSubstr;
+using ::testing::Not;
 using ::testing::Pointwise;
 
 using ResidualFunction = std::function<std::vector<double>(const ParameterSet&)>;
@@ -98,7 +99,6 @@ TEST(Glm, FitsALinearModelInOneIteration) {
   EXPECT_THAT(trial.fit.jacobian->columns[2], Pointwise(DoubleNear(1e-9), {0.0, 1.0, 4.0, 9.0}));
 }
 
-/// Where the unbounded optimum lies outside, that of the others is found with the parameter at its bound.
 /// In a valley as narrow as a set of the differences, to which no step leads.
 TEST(Glm, TheBestSetIsTheOneOfTheLeastSumBeItADifference) {
   const auto residualsOf = [](const ParameterSet& set) {
@@ -110,8 +110,17 @@ TEST(Glm, TheBestSetIsTheOneOfTheLeastSumBeItADifference) {
   EXPECT_EQ(trial.summary.bestResult.number, 2);
   EXPECT_NEAR(trial.fit.set.at(0), 5.2, 1e-9);
   EXPECT_THAT(notesOf(trial), HasSubstr("The best set, evaluation 2, is one of the differences: sum of squares 8.41"));
+
+  // A sample that uses up the budget has no differences; those that a budget cuts off count.
+  const GlmTrial sampled = glmSearch({{-10}, {10}, {5}}, residualsOf, {.settings = {.sampleSize = 3}, .budget = 3});
+  EXPECT_THAT(notesOf(sampled), Not(HasSubstr("differences")));
+  const auto plane = [](const ParameterSet& set) { return std::vector{set[0] + set[1], 1.0}; };
+  const GlmTrial cut = glmSearch({{-10, -10}, {10, 10}, {-5, -5}}, plane, {.budget = 2});
+  EXPECT_EQ(cut.summary.bestResult.number, 2);
+  EXPECT_THAT(notesOf(cut), HasSubstr("The best set, evaluation 2, is one of the differences"));
 }
 
+/// Where the unbounded optimum lies outside, that of the others is found with the parameter at its bound.
 TEST(Glm, KeepsToBoundsThatAreActiveAtTheOptimum) {
   SearchBounds bounds = kParabolaBounds;
   bounds.upper[2] = 0.25;
