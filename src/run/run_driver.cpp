@@ -524,12 +524,16 @@ std::string RunDriver::whereWarningsAre() const {
   return warningCountText() + ": the lines above that begin with \"Warning: \"";
 }
 
-/// Says on standard error how many warnings there are and where.
+/// Says on standard error how many warnings there are and where. The first is mostly of the setup, the last of what the
+/// run has found.
 void RunDriver::tellOfWarnings() const {
   if (state_.log.warningCount() == 0) return;
   showMessage(fmt::format("{} in {}{}: {}", warningCountText(), state_.log.path(),
                           state_.log.warningCount() == 1 ? "" : "; the first", state_.log.warnings().front()),
               {}, MessageType::warning);
+  if (state_.log.warningCount() > 1) {
+    showMessage("The last of them: " + state_.log.lastWarning(), {}, MessageType::warning);
+  }
 }
 
 /// Writes the reasons of the failures to the log, and how often each occurred.

@@ -63,6 +63,7 @@ void RunLog::warning(std::string_view text) {
   if (!isClosed_) {
     line(record);
     if (++warningCount_ <= static_cast<int>(kMostWarningsKept)) warnings_.emplace_back(text);
+    lastWarning_ = text;
   }
   if (listener_) listener_(record);
 }

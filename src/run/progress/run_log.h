@@ -38,6 +38,7 @@ class RunLog final {
 
   /// The first warnings, without "Warning: ", at most kMostWarningsKept of them.
   const std::vector<std::string>& warnings() const { return warnings_; }
+  const std::string& lastWarning() const { return lastWarning_; }
   int warningCount() const { return warningCount_; }
 
   /// Writes that no model was run, and why ("The setup is refused"), for isOfNoRun().
@@ -69,6 +70,7 @@ class RunLog final {
   std::string head_;
   std::function<void(std::string_view)> listener_;
   std::vector<std::string> warnings_;
+  std::string lastWarning_;
   int warningCount_ = 0;
   std::string writeError_;
   std::string lastRecord_;
