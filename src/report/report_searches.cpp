@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <filesystem>
 #include <iterator>
+#include <span>
 #include <string_view>
 #include <system_error>
 #include <vector>

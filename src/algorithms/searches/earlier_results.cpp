@@ -6,6 +6,7 @@
 #include <limits>
 #include <map>
 #include <set>
+#include <span>
 #include <utility>
 
 #include <fmt/format.h>
