@@ -9,6 +9,7 @@
 
 #include <fmt/format.h>
 
+#include "common/column_heading.h"
 #include "common/data_table.h"
 #include "common/files.h"
 #include "common/run_files.h"
@@ -35,24 +36,30 @@ struct Places {
   std::size_t firstParameter = 0;
 };
 
-/// Empty if this is another table.
-std::optional<Places> placesIn(const ReadTable& table, std::size_t parameterCount) {
-  if (table.columns.size() < kOptional + parameterCount + 1 || table.columns.back() != kLastColumn) return std::nullopt;
+/// Empty if this is another table, or one of other parameters.
+std::optional<Places> placesIn(const ReadTable& table, std::span<const std::string> parameters) {
+  if (table.columns.size() < kOptional + parameters.size() + 1 || table.columns.back() != kLastColumn) {
+    return std::nullopt;
+  }
   Places places;
-  places.firstParameter = table.columns.size() - parameterCount - 1;
-  // A parameter may have the name of a column, which stands before it.
-  const std::span<const std::string> names(table.columns.begin(), places.firstParameter);
+  places.firstParameter = table.columns.size() - parameters.size() - 1;
+  std::vector<std::string> taken(table.columns.begin(),
+                                 table.columns.begin() + static_cast<std::ptrdiff_t>(places.firstParameter));
   std::size_t count = 0;
   for (std::size_t i = 0; i < std::size(kColumns); ++i) {
-    const auto found = std::ranges::find(names, kColumns[i]);
-    if (found == names.end() && i < kOptional) return std::nullopt;
-    if (found == names.end()) continue;
-    places.columns[i] = static_cast<std::size_t>(found - names.begin());
+    const auto found = std::ranges::find(taken, kColumns[i]);
+    if (found == taken.end() && i < kOptional) return std::nullopt;
+    if (found == taken.end()) continue;
+    places.columns[i] = static_cast<std::size_t>(found - taken.begin());
     ++count;
   }
-  // More or fewer parameters than the setup has: a column before them is unknown, or one of these stands among them.
-  const bool hasOther = count < names.size() || table.columns[places.firstParameter] == kColumns[kOptional];
-  return hasOther ? std::nullopt : std::optional(places);
+  if (count < taken.size()) return std::nullopt;
+  taken.emplace_back(kLastColumn);
+  for (std::size_t k = 0; k < parameters.size(); ++k) {
+    taken.push_back(columnHeading(parameters[k], taken));
+    if (table.columns[places.firstParameter + k] != taken.back()) return std::nullopt;
+  }
+  return places;
 }
 
 std::optional<ReportedRepetition> readRepetition(const std::vector<std::string>& cells, const Places& places) {
@@ -103,12 +110,22 @@ std::vector<ReportedStretch> readStretches(const std::string& filePrefix, std::s
   return stretches;
 }
 
+/// Whether it has ended with a best set, which no other has for the same reason.
+bool isCompared(const ReportedRepetition& one) {
+  return !one.termination.empty() && one.best != 0 && one.sameAs == 0;
+}
+
+std::string_view nameOf(FrontAgreement::Verdict verdict) {
+  static constexpr std::string_view kNames[] = {"none", "differ", "agree", "one set"};
+  return kNames[static_cast<std::size_t>(verdict)];
+}
+
 /// As in the log: by those that have ended with a best set.
 NearlyEqual nearlyEqualOf(const std::vector<ReportedRepetition>& all) {
   double least = std::numeric_limits<double>::infinity();
   std::vector<double> starts;
   for (const ReportedRepetition& one : all) {
-    if (one.termination.empty() || one.best == 0 || one.sameAs != 0) continue;
+    if (!isCompared(one)) continue;
     if (one.aggregate < least) least = one.aggregate;
     starts.push_back(one.start);
   }
@@ -117,21 +134,21 @@ NearlyEqual nearlyEqualOf(const std::vector<ReportedRepetition>& all) {
 
 }  // namespace
 
-std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePrefix, std::size_t parameterCount,
+std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePrefix,
+                                                       std::span<const std::string> parameters,
                                                        std::vector<std::string>& faults) {
   const std::string path = runFilePath(filePrefix, run_files::kRepetitions);
   const auto text = readFileIfThere(path);
   if (!text) return std::nullopt;
   const ReadTable table = readDataTable(*text);
-  const auto places = placesIn(table, parameterCount);
+  const auto places = placesIn(table, parameters);
   if (!places) {
     faults.push_back(fmt::format("The repetitions are not shown: {} is damaged, or of other parameters than the setup",
                                  fileNameOf(path)));
     return std::nullopt;
   }
   ReportedRepetitions found;
-  found.parameters.assign(table.columns.begin() + static_cast<std::ptrdiff_t>(places->firstParameter),
-                          table.columns.end() - 1);
+  found.parameters.assign(parameters.begin(), parameters.end());
   for (const std::vector<std::string>& cells : table.rows) {
     if (auto one = readRepetition(cells, *places)) found.all.push_back(*std::move(one));
   }
@@ -147,6 +164,22 @@ std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePr
   return found;
 }
 
+void compareFronts(ReportedRepetitions& repetitions, const std::optional<ReportedFront>& front) {
+  std::vector<double> hypervolumes;
+  for (const ReportedRepetition& one : repetitions.all) {
+    if (isCompared(one) && std::isfinite(one.hypervolume)) hypervolumes.push_back(one.hypervolume);
+  }
+  if (hypervolumes.empty()) return;
+  repetitions.hypervolumeOfAll = *std::ranges::max_element(hypervolumes);
+  if (front && front->course) {
+    for (const double hypervolume : front->course->hypervolumes) {
+      if (std::isfinite(hypervolume)) repetitions.hypervolumeOfAll = hypervolume;
+    }
+  }
+  const auto size = front ? static_cast<std::size_t>(std::ranges::count(front->ranks, 1)) : 0;
+  repetitions.agreement = frontAgreement(hypervolumes, repetitions.hypervolumeOfAll, size);
+}
+
 void writeRepetitions(JsonWriter& json, const ReportedRepetitions& repetitions) {
   json.key("repetitions").beginObject().member("parameters", repetitions.parameters).key("all").beginArray();
   for (const ReportedRepetition& one : repetitions.all) {
@@ -159,6 +192,12 @@ void writeRepetitions(JsonWriter& json, const ReportedRepetitions& repetitions) 
     json.member("termination", one.termination).endObject();
   }
   json.endArray().member("tolerance", repetitions.nearly.tolerance).member("within", repetitions.nearly.text());
+  json.member("atStart", repetitions.nearly.atStart);
+  if (std::isfinite(repetitions.hypervolumeOfAll)) {
+    json.key("fronts").beginObject().member("ofAll", repetitions.hypervolumeOfAll);
+    json.member("near", repetitions.agreement.near);
+    json.member("verdict", nameOf(repetitions.agreement.verdict)).endObject();
+  }
   json.key("stretches").beginArray();
   for (const ReportedStretch& one : repetitions.stretches) {
     json.beginArray().integer(one.repetition).integer(one.first).integer(one.last).endArray();

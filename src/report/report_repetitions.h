@@ -2,11 +2,13 @@
 
 #include <limits>
 #include <optional>
+#include <span>
 #include <string>
 #include <vector>
 
 #include "algorithms/searches/repetitions.h"
 #include "report/json_writer.h"
+#include "report/report_front.h"
 
 namespace mirevo {
 
@@ -37,12 +39,17 @@ struct ReportedRepetitions {
   std::vector<ReportedRepetition> all;
   std::vector<ReportedStretch> stretches;  ///< none: whose evaluations are whose is not known
   NearlyEqual nearly;                      ///< which aggregates count as equal to the least
+  FrontAgreement agreement;                ///< of their fronts; compareFronts()
+  double hypervolumeOfAll = std::numeric_limits<double>::quiet_NaN();  ///< of the front of all; likewise
 };
 
 /// The repetitions of a search; empty if there are none, or if they cannot be read, with the reason in `faults`, which
-/// has a text on rows that are left out, too. The count is that of the setup.
-std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePrefix, std::size_t parameterCount,
+/// has a text on rows that are left out, too. `parameters`: those that vary, of the setup.
+std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePrefix,
+                                                       std::span<const std::string> parameters,
                                                        std::vector<std::string>& faults);
+/// Compares the fronts of those that have ended as the log does. `front`: that of all of them, if it can be read.
+void compareFronts(ReportedRepetitions& repetitions, const std::optional<ReportedFront>& front);
 
 /// As a member of the report's data.
 void writeRepetitions(JsonWriter& json, const ReportedRepetitions& repetitions);

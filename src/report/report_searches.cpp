@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <filesystem>
 #include <iterator>
+#include <span>
 #include <string_view>
 #include <system_error>
 #include <vector>
@@ -67,7 +68,7 @@ void addFront(const RunConfig& config, const std::string& filePrefix, std::size_
 
 }  // namespace
 
-void addSearchTables(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount,
+void addSearchTables(const RunConfig& config, const std::string& filePrefix, std::span<const std::string> parameters,
                      ReportData& data) {
   if (data.run.task != "optimisation") return;
   const bool isFinished = data.run.stage == RunStage::finished;
@@ -78,8 +79,9 @@ void addSearchTables(const RunConfig& config, const std::string& filePrefix, std
     fault = fileNameOf(runFilePath(filePrefix, run_files::kEstimateLimits)) + " is not there";
   }
   if (!fault.empty()) faults.push_back(fmt::format("The limits of the parameters are not shown: {}", fault));
-  addFront(config, filePrefix, variableCount, data, faults);
-  data.repetitions = reportedRepetitions(filePrefix, variableCount, faults);
+  addFront(config, filePrefix, parameters.size(), data, faults);
+  data.repetitions = reportedRepetitions(filePrefix, parameters, faults);
+  if (data.repetitions) compareFronts(*data.repetitions, data.front);
   const bool isRepeated = searchRepetitions({{}, config.resultSettings, {}, {}}) > 1;
   if (isRepeated && !isFinished && !isThere(filePrefix, run_files::kRepetitions)) {
     faults.push_back(unwrittenText("table of the repetitions", filePrefix, run_files::kRepetitions, data.run.stage));

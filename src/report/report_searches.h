@@ -1,5 +1,6 @@
 #pragma once
 
+#include <span>
 #include <string>
 
 #include "report/report_data.h"
@@ -8,9 +9,9 @@
 namespace mirevo {
 
 /// Adds what a search has left beside its results: the limits of its parameters, its front, its repetitions, and notes
-/// on what of these is damaged, or not there although a finished search of its kind writes it. `data` has the run, its
-/// evaluations and its series.
-void addSearchTables(const RunConfig& config, const std::string& filePrefix, std::size_t variableCount,
+/// on what of these is damaged, or not there although a finished search of its kind writes it. `parameters`: those that
+/// vary. `data` has the run, its evaluations and its series.
+void addSearchTables(const RunConfig& config, const std::string& filePrefix, std::span<const std::string> parameters,
                      ReportData& data);
 
 }  // namespace mirevo

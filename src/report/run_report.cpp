@@ -142,7 +142,7 @@ ReportData ReportBuilder::build() {
   addSeries();
   addValidation(config_, sources_.results.rows, best_, data_);
   addAnalyses();
-  addSearchTables(config_, filePrefix_, space().size(), data_);
+  addSearchTables(config_, filePrefix_, space().names, data_);
   return std::move(data_);
 }
 

@@ -198,7 +198,7 @@ TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
     runToEnd();
     const std::string rows = folder_.read(kResults);
     if (*cutAt != '\0') folder_.write(kResults, rows.substr(0, rows.find(cutAt) + 9));
-    writeSetup(of, 3, "");
+    writeSetup(of, 3, "Repetition_Order = 'consecutive'");  // the default
     runToEnd();
     EXPECT_THAT(log(), HasSubstr(fmt::format("Repetitions was raised from {} to 3: further ones follow", before)));
     const auto found = results();
@@ -211,7 +211,8 @@ TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
   const std::tuple<RunSettings, int, std::string, const char*> refused[] = {
       {raised, 3, "", "Max_No_Evaluations: 14 then, 30 now: it holds for each of 3 repetitions"},
       {settings, 2, "", "Repetitions of OPTIMISATION_ALGORITHM: 3 then, 2 now"},
-      {settings, 4, kInSideBySideOrder, "Repetition_Order of OPTIMISATION_ALGORITHM: absent then, 'side by side' now"}};
+      {settings, 4, kInSideBySideOrder,
+       "Repetition_Order of OPTIMISATION_ALGORITHM: 'consecutive' then, 'side by side' now"}};
   const auto before = results();
   for (const auto& [other, count, order, reason] : refused) {
     writeSetup(other, count, order);

@@ -61,7 +61,7 @@ class SearchTables : public ::testing::Test {
     faults_.clear();
     return reportedFront(folder_ / "basin", objectives, parameters, faults_);
   }
-  std::optional<ReportedRepetitions> repetitions(std::size_t parameters = 2) {
+  std::optional<ReportedRepetitions> repetitions(const std::vector<std::string>& parameters = {"a", "b # c"}) {
     faults_.clear();
     return reportedRepetitions(folder_ / "basin", parameters, faults_);
   }
@@ -171,7 +171,7 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   DataTable table{run_files::kRepetitions,
                   {},
                   {"Repetition", "Seed", "Evaluations", "Best_Evaluation", "Aggregate", "Loops", "Start_Aggregate", "a",
-                   "b # c", "Termination"},
+                   "b _ c", "Termination"},
                   {row(1, 0.5), row(2, std::nan(""))}};
   const std::string whole = dataTableText(table);
   write(run_files::kRepetitions, whole);
@@ -196,14 +196,18 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   EXPECT_THAT(json.endObject().take(),
               AllOf(HasSubstr(R"("number":2,"seed":6,"evaluations":60,"best":6,"aggregate":null,"loops":7,"start":9.5,)"
                               R"("parameters":[0.1,0.3333333333],"termination":"the budget\u0009is used up")"),
-                    HasSubstr(R"("tolerance":0.005,"within":"1 % of the least")"),
+                    HasSubstr(R"("tolerance":0.005,"within":"1 % of the least","atStart":0,)"),
                     HasSubstr(R"("stretches":[[1,1,10],[2,11,20]])"), Not(HasSubstr("hypervolume"))));
 
   write(run_files::kRepetitionRows, "Repetition\tFirst\n1\t1\n");
   EXPECT_TRUE(repetitions());
   EXPECT_THAT(faults_, ElementsAre(HasSubstr("basin_Optimisation_RepetitionRows.dat is damaged")));
-  EXPECT_FALSE(repetitions(3));
+  EXPECT_FALSE(repetitions({"a", "b # c", "d"}));
   EXPECT_THAT(faults_, ElementsAre(HasSubstr("is damaged, or of other parameters than the setup")));
+  for (const std::vector<std::string>& others :
+       {std::vector<std::string>{"a"}, {"b # c"}, {"a", "d"}, {"b # c", "a"}, {"d", "a", "b # c"}}) {
+    EXPECT_FALSE(repetitions(others)) << others.front() << others.size();
+  }
   write(run_files::kRepetitions, std::string(whole).replace(whole.find("\n2\t") + 1, 1, "x"));
   const auto first = repetitions();
   ASSERT_TRUE(first);
@@ -219,6 +223,7 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   ASSERT_TRUE(ofFronts);
   EXPECT_EQ(ofFronts->all[1].hypervolume, 0.75);
   EXPECT_THAT(ofFronts->parameters, ElementsAre("a", "b # c"));
+  EXPECT_FALSE(repetitions({"d", "a", "b # c"})) << "one parameter fewer than the setup has";
   EXPECT_EQ(ofFronts->all[1].parameters[1], 1.0 / 3.0);
 
   // The same search as an earlier one, of parameters with names of columns.
@@ -228,9 +233,9 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   same.rows[0][7] = std::int64_t{0};
   same.rows[1][7] = std::int64_t{1};
   write(run_files::kRepetitions, dataTableText(same));
-  const auto twice = repetitions();
+  const auto twice = repetitions({"Seed", "Termination"});
   ASSERT_TRUE(twice);
-  EXPECT_THAT(twice->parameters, ElementsAre("Seed (2)", "Termination (2)"));
+  EXPECT_THAT(twice->parameters, ElementsAre("Seed", "Termination"));
   EXPECT_EQ(twice->all[0].seed, 5);
   EXPECT_EQ(twice->all[0].parameters[1], 1.0 / 3.0);
   JsonWriter ofSame;
@@ -249,13 +254,63 @@ TEST_F(SearchTables, RepetitionsAreThoseOfTheTableWithTheEvaluationsOfEach) {
   table.columns[7] = "Hypervolume";
   for (Row& cells : table.rows) cells.erase(cells.begin() + 6, cells.begin() + 8);
   write(run_files::kRepetitions, dataTableText(table));
-  const auto bare = repetitions();
+  const auto bare = repetitions({"a", "Hypervolume"});
   ASSERT_TRUE(bare);
   EXPECT_THAT(bare->parameters, ElementsAre("a", "Hypervolume"));
   EXPECT_EQ(bare->all[0].parameters[0], 0.1);
   EXPECT_TRUE(std::isnan(bare->all[0].start));
   EXPECT_TRUE(std::isnan(bare->all[0].hypervolume));
   EXPECT_EQ(bare->nearly.tolerance, 0.005);
+}
+
+/// What the program writes, of parameters with the names of its columns.
+TEST_F(SearchTables, RepetitionsOfParametersWithTheNamesOfColumnsAreRead) {
+  SearchSpace space;
+  space.lower = {0.0, 0.0};
+  space.upper = {1.0, 1.0};
+  space.transformation = {TransformationType::none, TransformationType::none};
+  std::vector<Repetition> all(1);
+  all[0] = {.seed = 1, .evaluations = 5, .bestEvaluation = 2, .aggregate = 3.0, .best = {0.25, 0.5}};
+  for (const bool hasFronts : {false, true}) {
+    if (hasFronts) all[0].front.emplace().hypervolume = 0.5;
+    for (const std::vector<std::string>& names :
+         {std::vector<std::string>{"Start_Aggregate", "b"}, {"Hypervolume", "Same_As"}, {"Seed", "Seed (2)"}}) {
+      space.names = names;
+      write(run_files::kRepetitions, dataTableText(repetitionTable(all, space)));
+      const auto found = repetitions(names);
+      ASSERT_TRUE(found) << names[0];
+      EXPECT_EQ(found->parameters, names);
+      EXPECT_THAT(found->all[0].parameters, ElementsAre(0.25, 0.5));
+      EXPECT_EQ(std::isfinite(found->all[0].hypervolume), hasFronts);
+    }
+  }
+}
+
+TEST_F(SearchTables, FrontsOfRepetitionsAreComparedWithThatOfAllOfThem) {
+  const auto repetition = [](int number, double hypervolume, const char* termination) {
+    ReportedRepetition one;
+    one.number = one.best = number;
+    one.hypervolume = hypervolume;
+    one.termination = termination;
+    return one;
+  };
+  ReportedRepetitions all;
+  all.all = {repetition(1, 0.34, "ended"), repetition(2, 0.995, "ended"), repetition(3, 0.9, "")};
+  ReportedFront front;
+  front.ranks = {1, 2};
+  front.course.emplace().hypervolumes = {0.1, 1.0, std::nan("")};
+  const auto json = [&] {
+    compareFronts(all, front);
+    JsonWriter writer;
+    writer.beginObject();
+    writeRepetitions(writer, all);
+    return writer.endObject().take();
+  };
+  EXPECT_THAT(json(), HasSubstr(R"("fronts":{"ofAll":1,"near":1,"verdict":"differ"})"));
+  all.all[0].hypervolume = 1.0;
+  EXPECT_THAT(json(), HasSubstr(R"("fronts":{"ofAll":1,"near":2,"verdict":"one set"})"));
+  front.ranks = {1, 1};
+  EXPECT_THAT(json(), HasSubstr(R"("verdict":"agree")"));
 }
 
 }  // namespace

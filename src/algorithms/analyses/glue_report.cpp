@@ -5,6 +5,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/analyses/glue.h"
+#include "common/column_heading.h"
 #include "common/run_files.h"
 #include "common/text.h"
 
@@ -65,12 +66,6 @@ std::string bestText(const EvaluatedSample& sample, const GlueWeights& weights, 
                      formatReal(judge.valuesOf(sample)[*weights.best]));
 }
 
-/// Where to write the parameters of the best sets is no question of columns: names that others have get a number.
-std::string headingOf(const std::string& name, std::span<const std::string> taken) {
-  const std::string plain = columnName(name);
-  return std::find(taken.begin(), taken.end(), plain) == taken.end() ? plain : plain + " (2)";
-}
-
 DataTable weightTable(const EvaluatedSample& sample, const GlueWeights& weights, const GlueJudge& judge,
                       const GlueSettings& settings, const AnalysisNames& names) {
   DataTable table;
@@ -80,7 +75,7 @@ DataTable weightTable(const EvaluatedSample& sample, const GlueWeights& weights,
       "and the parameters on the model scale",
       behaviouralText(judge, settings), likelihoodText(settings)};
   table.columns = {"Evaluation", "Value", "Behavioural", "Weight"};
-  for (const std::string& name : names.parameters) table.columns.push_back(headingOf(name, table.columns));
+  for (const std::string& name : names.parameters) table.columns.push_back(columnHeading(name, table.columns));
   const std::vector<double> all = weights.ofAll(sample.size());
   std::vector<bool> isBehavioural(sample.size(), false);
   for (const std::size_t i : weights.behavioural) isBehavioural[i] = true;

@@ -96,6 +96,9 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
   if (archive.members().empty() || count < kFewestEvaluations) return {};
   const FrontScale scale(archive.points(), reference);
   if (!scale.isReferenceUsable()) return {};
+  const std::string_view whose = isRepetition ? "Course over the evaluations of this repetition" : "Course";
+  const std::string last =
+      fmt::format("{}evaluation {} of {}", isRepetition ? "its " : "", archive.entries().back().evaluation, count);
   const double quarter = scale.hypervolumeShare(archive.frontAfter(count / 4));
   const double half = scale.hypervolumeShare(archive.frontAfter(count / 2));
   const double tenth = scale.hypervolumeShare(archive.frontAfter(static_cast<int>(std::int64_t{count} * 9 / 10)));
@@ -105,11 +108,17 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
     return fmt::format("grew from {:.6g} to {:.6g} ({} %)", from, to, roundedText(100.0 * (to - from) / to, 2));
   };
   std::vector<std::string> lines;
-  lines.push_back(fmt::format(
-      "{}: in the second half of the evaluations the hypervolume {}, in the last tenth it {}; the last set to join the "
-      "front was {}evaluation {} of {}",
-      isRepetition ? "Course over the evaluations of this repetition" : "Course", riseText(half, end),
-      riseText(tenth, end), isRepetition ? "its " : "", archive.entries().back().evaluation, count));
+  // A single set has no extent of which a share could be missing: whatever it replaced, its hypervolume is all.
+  const bool isOneSet = archive.members().size() == 1;
+  if (isOneSet) {
+    lines.push_back(fmt::format("{}: the front is a single set, {}, so that the growth of its hypervolume says nothing",
+                                whose, last));
+  } else {
+    lines.push_back(
+        fmt::format("{}: in the second half of the evaluations the hypervolume {}, in the last tenth it {}; the last "
+                    "set to join the front was {}",
+                    whose, riseText(half, end), riseText(tenth, end), last));
+  }
   const std::string_view others = isRepetition ? "the other repetitions" : "other values of Random_Seed";
   if (!isBudgetUsed) {
     lines.push_back(fmt::format(
@@ -120,6 +129,7 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
         others));
     return lines;
   }
+  if (isOneSet) return lines;
   const double later = end - half;
   const double earlier = half - quarter;
   const double rise = earlier > later ? later * later / earlier : later;

@@ -6,11 +6,13 @@
 #include <limits>
 #include <map>
 #include <set>
+#include <span>
 #include <utility>
 
 #include <fmt/format.h>
 
 #include "algorithms/searches/initial_sample.h"
+#include "common/column_heading.h"
 #include "common/take_text.h"
 #include "common/text.h"
 
@@ -21,11 +23,11 @@ namespace {
 constexpr std::array<std::string_view, 3> kFixedColumns{"Evaluation", "Status", "Aggregate"};
 constexpr std::size_t kFirstParameter = 2;  ///< behind the number and the status
 
-/// The heading that a parameter has in a result file.
-std::string headingOf(const std::string& name) {
-  const std::string plain = columnName(name);
-  const bool isTaken = std::ranges::find(kFixedColumns, plain) != kFixedColumns.end();
-  return isTaken ? plain + " (2)" : plain;
+/// The headings that parameters in this order have in a result file.
+std::vector<std::string> headingsOf(std::span<const std::string> names) {
+  std::vector<std::string> taken(kFixedColumns.begin(), kFixedColumns.end());
+  for (const std::string& name : names) taken.push_back(columnHeading(name, taken));
+  return {taken.begin() + kFixedColumns.size(), taken.end()};
 }
 
 std::string listOf(const std::vector<std::string>& names) {
@@ -52,12 +54,12 @@ std::vector<std::string> headingsOfRun(std::string_view settings) {
       entry->second.name = std::string(cells[3].substr(1, cells[3].size() - 2));
     }
   }
-  std::vector<std::string> headings;
+  std::vector<std::string> names;
   for (const std::string_view section : order) {
     const Parameter& parameter = parameters.at(std::string(section));
-    if (parameter.isVariable && !parameter.name.empty()) headings.push_back(headingOf(parameter.name));
+    if (parameter.isVariable && !parameter.name.empty()) names.push_back(parameter.name);
   }
-  return headings;
+  return headingsOf(names);
 }
 
 struct EarlierRow {
@@ -121,17 +123,17 @@ class EarlierRows final {
 
   bool takeParameters(std::vector<std::string> found) {
     std::vector<std::string> missing;
-    for (const std::string& name : space_.names) {
-      const auto column = std::ranges::find(found, headingOf(name));
+    const std::vector<std::string> expected = headingsOf(space_.names);
+    for (std::size_t k = 0; k < expected.size(); ++k) {
+      const auto column = std::ranges::find(found, expected[k]);
       if (column == found.end()) {
-        missing.push_back(name);
+        missing.push_back(space_.names[k]);
         continue;
       }
       columns_.push_back(static_cast<std::size_t>(column - found.begin()) + kFirstParameter);
     }
-    std::erase_if(found, [this](const std::string& heading) {
-      return std::ranges::any_of(space_.names, [&](const std::string& name) { return headingOf(name) == heading; });
-    });
+    std::erase_if(found,
+                  [&](const std::string& heading) { return std::ranges::find(expected, heading) != expected.end(); });
     if (missing.empty() && found.empty()) return true;
     std::string text = "expected the variable parameters of this setup";
     if (!missing.empty()) text += ", found no " + listOf(missing);

@@ -15,11 +15,6 @@
 namespace mirevo {
 namespace {
 
-/// Whether its front comes as near to that of all of them as best values count as equal.
-bool isNearAll(const RepetitionFront& front) {
-  return front.hypervolume >= (1.0 - kNearlyEqualShare) * front.hypervolumeOfAll;
-}
-
 std::vector<std::string> frontLines(std::span<const Repetition> repetitions, std::int32_t planned) {
   std::vector<std::string> lines{repetitionHeading(repetitions.size(), planned)};
   lines.push_back(fmt::format("   {:>3} {:>11} {:>11} {:>7} {:>7} {:>12} {:>11}  {}", "No.", "seed", "evaluations",
@@ -52,27 +47,28 @@ void addObjectives(const std::string& corner, const std::vector<const Repetition
   for (std::string& line : formatTable(corner, kHeadings, objectives, rows)) lines.push_back(std::move(line));
 }
 
-std::string verdict(const std::vector<const Repetition*>& ended, double least, double ofAll) {
-  if (std::ranges::all_of(ended, [](const Repetition* one) { return one->front->size == 1; })) {
-    return "The front of each repetition is a single set, so that there is no trade-off to compare: nothing better "
-           "than "
-           "the start was found, or one set is the best in every objective";
+std::string verdictText(const FrontAgreement& agreement, std::span<const double> hypervolumes, double ofAll) {
+  if (agreement.verdict == FrontAgreement::Verdict::oneSet) {
+    return fmt::format(
+        "Whatever the seed, the search found nearly the same single set, within {:g} % of the hypervolume of all, so "
+        "that there is no trade-off to compare: it is the best in every objective, or nothing better than the start "
+        "was found",
+        100.0 * kNearlyEqualShare);
   }
-  const auto near = std::ranges::count_if(ended, [](const Repetition* one) { return isNearAll(*one->front); });
-  if (near == std::ssize(ended)) {
+  if (agreement.verdict == FrontAgreement::Verdict::agree) {
     return fmt::format(
         "Whatever the seed, the search found nearly the same front: each hypervolume is within {:g} % of that of all",
         100.0 * kNearlyEqualShare);
   }
-  const auto behind =
-      std::ranges::count_if(ended, [](const Repetition* one) { return one->front->hypervolume == 0.0; });
+  const auto behind = std::ranges::count(hypervolumes, 0.0);
   return fmt::format(
       "The search has not found the same front each time: {} of {} repetitions come within {:g} % of the hypervolume "
       "of all, and {}. For a single search to come near it: a larger budget or population, or another search",
-      near, ended.size(), 100.0 * kNearlyEqualShare,
+      agreement.near, hypervolumes.size(), 100.0 * kNearlyEqualShare,
       behind > 0 ? fmt::format("{} behind the reference point altogether",
                                behind == 1 ? "one lies" : fmt::format("{} lie", behind))
-                 : fmt::format("the least is {:.3g} % below it", 100.0 * (1.0 - least / ofAll)));
+                 : fmt::format("the least is {:.3g} % below it",
+                               100.0 * (1.0 - *std::ranges::min_element(hypervolumes) / ofAll)));
 }
 
 }  // namespace
@@ -98,6 +94,7 @@ void RepeatedFronts::describe(const ParetoArchive& ofAll, std::span<const double
   for (std::size_t i = 0; i < repetitions.size(); ++i) {
     RepetitionFront& front = *repetitions[i].front;
     front.hypervolumeOfAll = hypervolumeOfAll;
+    front.sizeOfAll = all.size();
     const std::vector<FrontMember>& members = problems_[i].archive.members();
     if (members.empty()) continue;
     front.hypervolume = scale.hypervolumeShare(problems_[i].archive.front());
@@ -128,7 +125,7 @@ std::vector<std::string> repeatedFrontLines(std::span<const Repetition> repetiti
   }
   if (ended.size() < 2) return lines;
   const double ofAll = ended.front()->front->hypervolumeOfAll;
-  const Spread spread = spreadOf(std::move(hypervolumes));
+  const Spread spread = spreadOf(hypervolumes);
   lines.push_back(fmt::format(
       "Hypervolumes, on the scale of the front of all: least {:.6g}, median {:.6g}, greatest {:.6g}; of all {:.6g}",
       spread.least, spread.median, spread.greatest, ofAll));
@@ -139,7 +136,10 @@ std::vector<std::string> repeatedFrontLines(std::span<const Repetition> repetiti
        formatTable("Parameters of the compromises", kHeadings, space.names, parameterSpreads(ended, space))) {
     lines.push_back(std::move(line));
   }
-  if (ofAll > 0.0) lines.push_back(verdict(ended, spread.least, ofAll));
+  const FrontAgreement agreement = frontAgreement(hypervolumes, ofAll, ended.front()->front->sizeOfAll);
+  if (agreement.verdict != FrontAgreement::Verdict::none) {
+    lines.push_back(verdictText(agreement, hypervolumes, ofAll));
+  }
   return lines;
 }
 

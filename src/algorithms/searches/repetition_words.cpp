@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <iterator>
+#include <string_view>
 #include <utility>
 
 #include <fmt/format.h>
@@ -113,8 +114,12 @@ class SpreadText final {
                                   ended_.size() - improved_, ended_.size()));
     }
     if (!isSameEachTime()) lines.push_back(otherMinimaText());
-    const std::string wide = wideParameters();
     if (near_.size() < 2) return lines;
+    if (nearly_.atStart > 0) {
+      lines.push_back(atStartText());
+      return lines;
+    }
+    const std::string wide = wideParameters();
     if (!wide.empty()) {
       lines.push_back(fmt::format(
           "At nearly equal values these parameters take up more than {:g} % of their ranges, so that the calibration "
@@ -132,14 +137,28 @@ class SpreadText final {
  private:
   bool isSameEachTime() const { return near_.size() == ended_.size(); }
 
-  std::string noneImprovedText() const {
-    const bool isOne = std::ranges::all_of(
+  bool isOneStart() const {
+    return std::ranges::all_of(
         ended_, [this](const Repetition* repetition) { return repetition->start == ended_.front()->start; });
+  }
+
+  std::string_view otherStartsText() const {
+    return isOneStart() ? ", or other starts (Include_Initial_Parameters = 0)" : "";
+  }
+
+  std::string noneImprovedText() const {
     return fmt::format(
         "None of the {} repetitions found anything better than {}, which says nothing of a minimum: the start may be "
         "one, or the search does not get away from it. A larger budget can tell{}",
-        ended_.size(), isOne ? "the set that all of them began with" : "the sets that they began with",
-        isOne ? ", or other starts (Include_Initial_Parameters = 0)" : "");
+        ended_.size(), isOneStart() ? "the set that all of them began with" : "the sets that they began with",
+        otherStartsText());
+  }
+
+  std::string atStartText() const {
+    return fmt::format(
+        "{} of {} repetitions began with a value within {} already, so that best values near each other say nothing of "
+        "a minimum: the start may be one, or the search does not get away from it. A larger budget can tell{}",
+        nearly_.atStart, ended_.size(), nearly_.text(), otherStartsText());
   }
 
   std::vector<std::string> parameterTable() const {

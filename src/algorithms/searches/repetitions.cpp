@@ -47,7 +47,24 @@ NearlyEqual nearlyEqual(double least, std::span<const double> starts) {
   double share = kNearlyEqualShare * std::abs(least);
   if (least < 0.0 && !known.empty()) share = std::min(share, kNearlyEqualShare * fall);
   const double nearZero = kNearlyEqualFall * fall;
-  return {std::max(share, nearZero), least > 0.0 && share >= nearZero};
+  NearlyEqual nearly{std::max(share, nearZero), least > 0.0 && share >= nearZero};
+  const auto atStart = static_cast<std::size_t>(
+      std::ranges::count_if(known, [&](double start) { return start <= least + nearly.tolerance; }));
+  if (2 * atStart >= starts.size()) nearly.atStart = atStart;
+  return nearly;
+}
+
+FrontAgreement frontAgreement(std::span<const double> hypervolumes, double ofAll, std::size_t sizeOfAll) {
+  using Verdict = FrontAgreement::Verdict;
+  const double least = (1.0 - kNearlyEqualShare) * ofAll;
+  FrontAgreement found;
+  found.near = static_cast<std::size_t>(
+      std::ranges::count_if(hypervolumes, [least](double hypervolume) { return hypervolume >= least; }));
+  if (hypervolumes.size() < 2 || !(ofAll > 0.0)) return found;
+  found.verdict = found.near < hypervolumes.size() ? Verdict::differ
+                  : sizeOfAll == 1                 ? Verdict::oneSet
+                                                   : Verdict::agree;
+  return found;
 }
 
 std::string NearlyEqual::text() const {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <limits>
 #include <optional>
@@ -45,7 +46,23 @@ struct RepetitionFront {
   std::vector<double> least = {};       ///< of each objective; empty without a front
   std::vector<double> compromise = {};  ///< the objectives of its best set; likewise
   double hypervolumeOfAll = 0.0;        ///< of the front of all
+  std::size_t sizeOfAll = 0;            ///< sets on the front of all
 };
+
+/// What follows from the fronts of the repetitions that have ended with one.
+struct FrontAgreement {
+  enum class Verdict : std::uint8_t {
+    none,    ///< nothing to compare: fewer than two fronts, or no hypervolume of all
+    differ,  ///< not all come near the front of all
+    agree,   ///< all do
+    oneSet   ///< all do, and the front of all is a single set, without a trade-off
+  };
+  Verdict verdict = Verdict::none;
+  std::size_t near = 0;  ///< fronts within kNearlyEqualShare of the hypervolume of all
+};
+/// `hypervolumes`: of their fronts, on the scale of the front of all; `ofAll` and `sizeOfAll` of that, which may have
+/// sets that none of theirs has; 0 sets: not known.
+FrontAgreement frontAgreement(std::span<const double> hypervolumes, double ofAll, std::size_t sizeOfAll);
 
 /// A repetition as far as it has come. The best set of a search for a front is the set of its front that is nearest to
 /// the ideal point of the front of all repetitions, on the scale of that.
@@ -88,13 +105,16 @@ DataTable repetitionRowTable(std::span<const RepetitionStretch> stretches);
 /// anywhere then,
 inline constexpr double kNearlyEqualShare = 0.01;
 /// or than this share of that way, where that is more: a share of a least value at 0 is nothing. So much numbers of 32
-/// bits resolve where the repetitions began, so that a poor start makes no other values equal.
+/// bits resolve where the repetitions began.
 inline constexpr double kNearlyEqualFall = 1.0e-7;
 
 /// Which best values count as equal to the least.
 struct NearlyEqual {
   double tolerance = 0.0;  ///< above the least
   bool isOfLeast = false;  ///< it is kNearlyEqualShare of the least value, which is above 0
+  /// Repetitions that began with such a value, if these are half of them or more, so that their best values lie near
+  /// each other though they have found next to nothing; else 0.
+  std::size_t atStart = 0;
 
   /// "1 % of the least", "0.0012 of the least"
   std::string text() const;

@@ -31,7 +31,6 @@ constexpr double kMadeAgain = std::numeric_limits<double>::infinity();
 constexpr CodeName kModelNames[] = {{0, "quadratic polynomial"}, {1, "Gaussian process"}};
 constexpr std::string_view kNeighbourhoodKeyword = "Neighbourhood_Size";
 constexpr std::string_view kGenerationsKeyword = "No_Initial_Generations";
-constexpr std::string_view kCheckKeyword = "Check_Interval";
 constexpr std::string_view kCheckRefusal = "Error: Invalid check interval for surrogate modelling optimisation";
 constexpr std::string_view kNeighbourhoodRefusal =
     "Error: Invalid neighbourhood size for surrogate modelling optimisation";
@@ -108,7 +107,7 @@ const SettingSection<SurrogateSection>& surrogateSection() {
                         "provide at least `Neighbourhood_Size` evaluated sets, if that is given.",
              .checkOrder = 3}),
         checked<Section>(setting<Section>([](auto& s) -> auto& { return s.surrogate.checkInterval; },
-                                          {.name = kCheckKeyword,
+                                          {.name = kCheckIntervalKeyword,
                                            .defaultValue = "0",
                                            .range = from(0),
                                            .refusal = kCheckRefusal,
@@ -118,7 +117,7 @@ const SettingSection<SurrogateSection>& surrogateSection() {
                                            .checkOrder = 4}),
                          [](const Section& s) -> std::optional<SettingRefusal> {
                            if (s.surrogate.checkInterval != 1) return std::nullopt;
-                           return SettingRefusal{std::string(kCheckRefusal), kCheckKeyword,
+                           return SettingRefusal{std::string(kCheckRefusal), kCheckIntervalKeyword,
                                                  "expected 0, or at least 2: with 1 the surrogate is never used"};
                          })}}};
   return section;

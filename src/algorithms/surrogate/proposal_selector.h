@@ -37,6 +37,7 @@ struct SurrogateSection {
   std::size_t variableCount = 0;
 };
 const SettingSection<SurrogateSection>& surrogateSection();
+inline constexpr std::string_view kCheckIntervalKeyword = "Check_Interval";
 
 /// Refuses a given neighbourhood that is larger than the number of parameter sets evaluated before the model is used:
 /// `available`, those of the initial sample and the initial generations.

@@ -302,6 +302,8 @@ export interface Repetitions {
   all: Repetition[];
   tolerance: number; // above the least aggregate: as good as it
   within: string; // that tolerance in words, "1 % of the least"
+  atStart: number; // began as near to the least as that, where these are half of them or more; else 0
+  fronts?: { ofAll: number; near: number; verdict: 'none' | 'differ' | 'agree' | 'one set' }; // how near their fronts come to that of all
   stretches: [number, number, number][]; // repetition, first and last of successive evaluations of it
 }
 

@@ -346,9 +346,12 @@ void SetupSection::takeValue(const KeywordRow& row, const SetupValue& value, boo
   echo(row, isFile && !isDefault ? SetupValue(written(row.name())) : value, isDefault);
   row.store(settings, value);
   if (!row.facts.bearsOnResults) return;
+  const bool hasDefault = !row.isRequired() && !row.isLeftOutByDefault();
+  const bool isLikeDefault =
+      isDefault || (hasDefault && formatSetupValue(value) == formatSetupValue(defaultSetupValue(row)));
   file_->resultSettings().push_back({path_, std::string(row.name()),
                                      isFile ? file_->relative(std::get<std::string>(value)) : formatSetupValue(value),
-                                     isDefault});
+                                     isLikeDefault});
 }
 
 void SetupSection::check(const BoundSection& section) const {

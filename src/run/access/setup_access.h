@@ -20,7 +20,7 @@ struct ResultSetting {
   std::string section;  ///< names below the target, `/` between them
   std::string keyword;
   std::string value;  ///< that of a coded keyword is its number, if it has one; file names are relative to the setup
-  bool isDefault = false;
+  bool isDefault = false;  ///< absent, or written with the value that it has then
 };
 
 /// A parsed setup file and the log to which everything read from it is echoed.

@@ -52,11 +52,25 @@ const SettingSection<OptimisationTask>& optimisationSection() {
         choice<OptimisationTask>(
             [](OptimisationTask& task, const SetupValue& value) { takeRepetitionOrder(task.repetitions, value); },
             {.name = kRepetitionOrderKeyword,
-             .defaultValue = kNoDefault,
+             .defaultValue = "'consecutive'",
              .codes = repetitionOrderNames(),
              .meaning = "One repetition after the other, or all at the same time, which fills slots by searches that "
-                        "propose one set at a time. Each finds the same either way. Without it, consecutive."})}}};
+                        "propose one set at a time. Each finds the same either way."})}}};
   return section;
+}
+
+/// The name of a section inside OPTIMISATION_ALGORITHM.
+std::string_view nameInside(const SectionRow& row) {
+  return row.path.substr(row.path.rfind('/') + 1);
+}
+
+/// The other keywords of the section stand in many setups without the surrogate model.
+void warnOfUnusedChecks(const SetupSection& target, const SetupSection& section) {
+  const SectionRow& surrogate = surrogateSection().row;
+  const auto interval = target.peek(surrogate.path, kCheckIntervalKeyword);
+  if (!interval || *interval == SetupValue(std::int32_t{0})) return;
+  const auto control = section.openIfPresent(nameInside(surrogate));
+  if (control) control->warn(kCheckIntervalKeyword, fmt::format("has no effect without {} = 1", kSurrogateKeyword));
 }
 
 /// The range of an integer parameter is never empty.
@@ -88,11 +102,6 @@ void refuseIntegers(const TaskReading& reading, std::string_view search) {
                     "Parameter_Type = 1 fixes it, other searches vary it",
                     search));
   }
-}
-
-/// The name of a section inside OPTIMISATION_ALGORITHM.
-std::string_view nameInside(const SectionRow& row) {
-  return row.path.substr(row.path.rfind('/') + 1);
 }
 
 void warnOffGrid(const ModelParameter& parameter, std::span<const double> values, const SetupSection& section,
@@ -160,7 +169,11 @@ void OptimisationTask::read(const TaskReading& reading) {
 
   const SetupSection stops = section.open(nameInside(stoppingSection().row));
   readStopping(stops, reading.variableCount);
-  if (surrogateUse == SurrogateUse::yes) readSurrogate(reading, section, stops);
+  if (surrogateUse == SurrogateUse::yes) {
+    readSurrogate(reading, section, stops);
+  } else {
+    warnOfUnusedChecks(reading.target, section);
+  }
 }
 
 /// A setup that names no way of drawing means none in particular.

@@ -231,8 +231,10 @@ TEST(GlueSummary, ComparesTheBehaviouralWithTheDrawnParameters) {
   EXPECT_TRUE(large.correlations.empty());
   ASSERT_EQ(large.largestCorrelations.size(), 1U);
   EXPECT_NEAR(large.largestCorrelations[0].value, summary.correlations[0][1], 1e-12);
-  const AnalysisNames names{{"a", "b"}, {"m"}, {"o"}, {}};
+  const AnalysisNames names{{"Weight", "Weight (2)"}, {"m"}, {"o"}, {}};
   const auto tables = glueTables(sample, weights, large, judgeOf(measure), settings, names);
+  EXPECT_EQ(tables.back().columns,
+            (std::vector<std::string>{"Evaluation", "Value", "Behavioural", "Weight", "Weight (2)", "Weight (2) (2)"}));
   EXPECT_EQ(tables[1].columns, (std::vector<std::string>{"First", "Second", "Correlation"}));
 }
 

@@ -203,6 +203,20 @@ TEST(FrontScale, AFrontOfOneSetHasAScaleWhateverItsUnit) {
   }
 }
 
+TEST(FrontScale, OfAFrontOfOneSetNoCourseIsTold) {
+  ParetoArchive archive;
+  for (int i = 1; i <= 40; ++i) archive.add(i, {1.0}, {i < 30 ? 9.0 : 2.0, i < 30 ? 9.0 : 3.0});
+  for (const bool isRepetition : {false, true}) {
+    EXPECT_THAT(frontCourseLines(archive, {}, true, isRepetition),
+                ::testing::ElementsAre(::testing::AllOf(
+                    ::testing::HasSubstr("the front is a single set, "),
+                    ::testing::HasSubstr("evaluation 30 of 40, so that the growth of its hypervolume says nothing"))));
+    EXPECT_EQ(frontCourseLines(archive, {}, false, isRepetition).size(), 2U) << "that it ended by itself stays";
+  }
+  archive.add(41, {1.0}, {1.0, 4.0});
+  EXPECT_THAT(frontCourseLines(archive, {}, true).front(), ::testing::HasSubstr("in the second half"));
+}
+
 TEST(FrontScale, SuggestsTheSetNearestToTheIdealPointAndMeasuresTheCourse) {
   ParetoArchive archive;
   archive.add(1, {1.0}, {100.0, 0.02});

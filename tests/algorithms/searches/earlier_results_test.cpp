@@ -87,6 +87,7 @@ TEST(EarlierResults, OtherParametersAndOtherFilesAreRefused) {
       {{"a", "b", "c"}, head + row, two, "expected the variable parameters of this setup, found no \"c\""},
       {{"b"}, head + row, "", "found no \"b\" and in their place \"a\""},  // it is no measure
       {{"a", "b", "Status"}, "Evaluation\tStatus\ta\tb\tStatus (2)\tAggregate\n" + row, "", ""},
+      {{"Status", "Status (2)"}, "Evaluation\tStatus\tStatus (2)\tStatus (2) (2)\tflow\tAggregate\n" + row, "", ""},
       {{"a", "b"}, "", "", "e.dat:1: expected a result file, with a header row that begins with Evaluation"},
       {{"a", "b"}, "a\tb\n1\t2\n", "", "e.dat:1: expected the header row of a result file"},
       {{"a", "b"}, "# x\nEvaluation\tStatus\ta\tb\n", "", "e.dat:2: expected the header row of a result file"},

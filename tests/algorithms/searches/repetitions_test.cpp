@@ -136,6 +136,29 @@ TEST(Repetitions, ThatTheyHaveTheirStartInCommonIsNoMinimumThatAllHaveFound) {
   EXPECT_THAT(spreadText(all), HasSubstr("\n2 of 3 repetitions found nothing better than what they began with\n"));
 }
 
+/// Of a function whose least value is 0, from a start with the value 4.
+TEST(Repetitions, ThatTheyHardlyGotAwayFromTheirStartsIsNoMinimumEither) {
+  const auto textOf = [](std::vector<double> values, std::vector<double> starts) {
+    std::vector<Repetition> all;
+    for (const double value : values) all.push_back(repetitionsOf({{value, {4.0, 1.5}}}).front());
+    for (std::size_t i = 0; i < all.size(); ++i) all[i].startAggregate = starts[i];
+    return spreadText(all);
+  };
+  const double none = std::numeric_limits<double>::quiet_NaN();
+  EXPECT_THAT(textOf({4.0, 3.97919, 4.0}, {4.0, 4.0, 4.0}),
+              AllOf(HasSubstr("\n2 of 3 repetitions found nothing better than what they began with\n3 of 3 repetitions "
+                              "began with a value within 1 % of the least already, so that best values near each other "
+                              "say nothing of a minimum"),
+                    HasSubstr("Include_Initial_Parameters = 0"), Not(HasSubstr("Whatever the seed"))));
+  EXPECT_THAT(textOf({2.0, 2.01}, {2.011, 50.0}),
+              AllOf(HasSubstr("\n1 of 2 repetitions began with a value within"), Not(HasSubstr("Whatever the seed"))));
+  // Most came from elsewhere.
+  for (const double other : {50.0, none}) {
+    EXPECT_THAT(textOf({2.0, 2.01, 2.0}, {2.011, other, 50.0}),
+                AllOf(Not(HasSubstr("began with a value")), HasSubstr("Whatever the seed")));
+  }
+}
+
 TEST(Repetitions, ThoseThatStartedFromTheSameSetsCountOnce) {
   std::vector<Repetition> all = repetitionsOf({{2.0, {1.0, 0.0}},
                                                {3.0, {4.0, 0.1}},
@@ -257,6 +280,37 @@ TEST(Repetitions, TheirFrontsAreComparedOnTheScaleOfThatOfAll) {
   all.resize(2);
   all[0].front->hypervolume = all[1].front->hypervolume = 0.9999 * all[0].front->hypervolumeOfAll;
   EXPECT_THAT(spreadText(all), EndsWith("nearly the same front: each hypervolume is within 1 % of that of all\n"));
+}
+
+/// Fronts of one set each, of which only the front of all says whether they are the same one.
+TEST(Repetitions, ThatTheirFrontsAreSingleSetsDoesNotMakeThemTheSame) {
+  using Verdict = FrontAgreement::Verdict;
+  const struct {
+    std::vector<double> hypervolumes;
+    double ofAll;
+    std::size_t sizeOfAll;
+    Verdict verdict;
+    const char* text;
+  } cases[] = {{{0.0, 0.091, 0.091}, 0.174, 2, Verdict::differ, "not found the same front each time: 0 of 3"},
+               {{0.34, 0.94, 1.0}, 1.0, 1, Verdict::differ, "1 of 3 repetitions come within 1 % of the hypervolume"},
+               {{0.995, 1.0}, 1.0, 1, Verdict::oneSet, "found nearly the same single set, within 1 %"},
+               {{0.995, 1.0}, 1.0, 3, Verdict::agree, "Whatever the seed, the search found nearly the same front:"},
+               {{1.0, 1.0}, 1.0, 0, Verdict::agree, "nearly the same front:"},
+               {{0.0, 0.0}, 0.0, 1, Verdict::none, "of all 0\n"},
+               {{1.0}, 1.0, 1, Verdict::none, "why it stopped"}};
+  for (const auto& one : cases) {
+    EXPECT_EQ(frontAgreement(one.hypervolumes, one.ofAll, one.sizeOfAll).verdict, one.verdict) << one.text;
+    std::vector<std::pair<double, ParameterSet>> best(one.hypervolumes.size(), {1.0, {1.0, 0.0}});
+    std::vector<Repetition> all = repetitionsOf(best);
+    for (std::size_t i = 0; i < all.size(); ++i) {
+      all[i].front = {one.hypervolumes[i], 1, 0, {0.0, 0.0}, {0.0, 0.0}, one.ofAll, one.sizeOfAll};
+    }
+    const std::string text = spreadText(all);
+    EXPECT_THAT(text, HasSubstr(one.text));
+    const bool isSame = one.verdict == Verdict::agree || one.verdict == Verdict::oneSet;
+    EXPECT_EQ(text.find("Whatever the seed") != std::string::npos, isSame) << text;
+    EXPECT_EQ(text.find("no trade-off") != std::string::npos, one.verdict == Verdict::oneSet) << text;
+  }
 }
 
 TEST(Repetitions, OneThatHasNotEndedOrHasNoResultHasItsRowAndNoShareInTheSpread) {

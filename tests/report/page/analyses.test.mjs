@@ -188,6 +188,30 @@ test('repetitions of a search for a front are compared by its hypervolume', asyn
   });
 });
 
+test('repetitions that agree in a single set, or in what they began with, are no sign of a minimum', async () => {
+  const fronts = (near, verdict) => {
+    const data = sample.withTables(4);
+    data.front.ranks = data.front.ranks.map((_, place) => (place === 0 ? 1 : 2));
+    data.repetitions.fronts = { ofAll: 2, near, verdict };
+    return data;
+  };
+  const atStart = sample.withTables(2);
+  atStart.repetitions.atStart = 2;
+  for (const [data, text, kind, absent] of [
+    [fronts(1, 'differ'), '1 of 3 repetitions come within 1 % of the hypervolume of all', 'warning', 'single set, and'],
+    [fronts(3, 'one set'), 'It is a single set, and whatever the seed', '', 'depends on the seed'],
+    [atStart, '2 of 3 repetitions began with a value within 1 % of the least already', 'warning', 'agree in']]) {
+    await withReport(data, {}, async (page) => {
+      const plain = (words) => words.replace(/[\u2068\u2069]/g, '');
+      const found = page.locator('#repetitions .findings li', { hasText: text.slice(0, 30) });
+      assert.ok(plain(await found.innerText()).startsWith(text), await found.innerText());
+      assert.equal(await found.getAttribute('class') ?? '', kind);
+      assert.ok(!plain(await page.locator('#repetitions .findings').innerText()).includes(absent));
+      assert.ok(!(await page.locator('#front .findings').innerText()).includes('its hypervolume') || data === atStart, 'the growth of a single set says nothing');
+    });
+  }
+});
+
 test('repetitions that have not ended, or have no result, are told of and not compared', async () => {
   const cut = (data) => {
     Object.assign(data.repetitions.all[0], { termination: '', aggregate: data.best.aggregate / 2 });

@@ -97,7 +97,7 @@ function repetitionsOf(data, haveFronts) {
   const one = (number, aggregate, second) => ({ number, seed: 4 + number, evaluations: evaluations.count / 3, best: best.number, aggregate, loops: 7, start: best.aggregate * 8, termination: 'the budget is used up',
     parameters: [parameters[0].best, second], ...(haveFronts ? { hypervolume: [1.99, 1.5, 1.2][number - 1] } : {}) });
   const stretches = Array.from({ length: 6 }, (_, turn) => [1 + turn % 3, 1 + turn * evaluations.count / 6, (turn + 1) * evaluations.count / 6]);
-  return { parameters: parameters.map(({ name }) => name), stretches, tolerance: best.aggregate * 0.01, within: '1 % of the least', all: [one(1, best.aggregate, 1), one(2, best.aggregate * 1.005, 4), one(3, best.aggregate * 2 + 1, 2.5)] };
+  return { parameters: parameters.map(({ name }) => name), stretches, atStart: 0, ...(haveFronts ? { fronts: { ofAll: 2, near: 1, verdict: 'differ' } } : {}), tolerance: best.aggregate * 0.01, within: '1 % of the least', all: [one(1, best.aggregate, 1), one(2, best.aggregate * 1.005, 4), one(3, best.aggregate * 2 + 1, 2.5)] };
 }
 
 /** A search with all that one can leave beside its results: limits of its parameters, a front of so many objectives, repetitions. */

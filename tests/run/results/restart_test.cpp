@@ -102,6 +102,12 @@ TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDef
   RestartSettings then = now;
   EXPECT_GT(std::erase_if(then.settings, std::mem_fn(&ResultSetting::isDefault)), 0U);
   EXPECT_THAT(changedSettings(then, now), IsEmpty());
+  // Also where the default is written by now.
+  const RestartSettings written = restartSettings(
+      read("Algorithm_Type = 1 => Algorithm_Type = 1\nRepetitions = 1\nRepetition_Order = 'consecutive'"));
+  EXPECT_THAT(changedSettings(now, written), IsEmpty());
+  EXPECT_THAT(changedSettings(then, written), IsEmpty());
+  EXPECT_THAT(changedSettings(written, now), IsEmpty());
 }
 
 TEST_F(RestartSettingsTest, ALaterVersionIsToldByItsNumbers) {

@@ -60,7 +60,9 @@ function costs(front: Front, places: number[], ends: number[]): Finding[] {
   return found;
 }
 
-function growth({ course }: Front): Finding[] {
+/** Of one set there is no growth: it is there, or it is not. */
+function growth({ course }: Front, onFront: number[]): Finding[] {
+  if (onFront.length < 2) return [];
   const places = course?.hypervolumes.flatMap((volume, place) => (volume === null || course.evaluations[place] === null ? [] : [place])) ?? [];
   const last = places[places.length - 1];
   if (!course || last === undefined || places.length < 3) return [];
@@ -127,7 +129,7 @@ export function frontSection(data: ReportData): Section | null {
     return made;
   };
   const several = front.objectives.length > 1 && places.length > 1;
-  const content: Node[] = [findingList([...violated(front, places), ...costs(front, places, ends), ...growth(front)])];
+  const content: Node[] = [findingList([...violated(front, places), ...costs(front, places, ends), ...growth(front, places)])];
   if (several) {
     content.push(heading('What one objective costs the other'), paragraph('In brackets: how far above the best value of the front. The number of an evaluation shows its point below.'), endsTable(front, picking, ends),
       drawn(front.objectives.length === 2 ? frontPlan(front, picking) : frontMatrixPlan(front, picking)), pointTable(front, picking));

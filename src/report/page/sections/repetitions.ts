@@ -68,18 +68,23 @@ function findings(data: ReportData, repetitions: Repetitions): Finding[] {
   const best = values[0]!;
   const near = ended.filter((one) => isNear(repetitions, one, best));
   const stuck = ended.filter(({ aggregate, start }) => aggregate !== null && start !== null && aggregate >= start);
+  const { atStart } = repetitions;
   const isAgreed = 2 * near.length > ended.length;
   if (ended.length > 1 && stuck.length === values.length) {
     return [{ kind: 'warning', text: `None of ${counted(ended.length, 'repetition')} found anything better than what it began with, which says nothing of a minimum: the start may be one, or the search does not get away from it.` }, ...others];
   }
   const found: Finding[] = [
     { text: `The best aggregates of ${counted(ended.length, 'repetition')}: least ${number(best, 6)}, median ${number(quantile(values, 0.5), 6)}, greatest ${number(values[values.length - 1], 6)}.` },
-    ...(ended.length < 2 ? [] : [{ kind: isAgreed ? 'good' as const : 'warning' as const, text: `${count(near.length)} of ${counted(ended.length, 'repetition')} ended within ${repetitions.within} value.${
+    ...(ended.length < 2 ? [] : [{ ...(isAgreed && atStart > 0 ? {} : { kind: isAgreed ? 'good' as const : 'warning' as const }), text: `${count(near.length)} of ${counted(ended.length, 'repetition')} ended within ${repetitions.within} value.${
       isAgreed ? '' : ' What the search finds depends on the seed: a larger budget helps, or taking the best of several repetitions, as here.'}` }]),
   ];
   found.push(...others);
   if (stuck.length > 0) found.push({ text: `${counted(stuck.length, 'repetition')} found nothing better than what it began with.` });
   if (near.length < 2) return found;
+  if (atStart > 0) {
+    found.push({ kind: 'warning', text: `${count(atStart)} of ${counted(ended.length, 'repetition')} began with a value within ${repetitions.within} already, so that best values near each other say nothing of a minimum: the start may be one, or the search does not get away from it.` });
+    return found;
+  }
   const apart = spreads(data, repetitions, near).filter(({ share }) => share > kApart);
   const text = (spread: Spread) => `${isolated(spread.name)} (${number(spread.low)} to ${number(spread.high)}, ${percent(spread.share, 2)} of its range)`;
   found.push(apart.length > 0
@@ -89,18 +94,16 @@ function findings(data: ReportData, repetitions: Repetitions): Finding[] {
 }
 
 /** Of searches for a front: how near each comes to that of all of them. */
-function frontFindings({ front }: ReportData, { all }: Repetitions): Finding[] {
+function frontFindings({ all, fronts }: Repetitions): Finding[] {
   const ended = compared(all);
   const others = othersThan(all, 'front');
   const volumes = sorted(ended.map(({ hypervolume }) => hypervolume ?? null));
   const greatest = volumes[volumes.length - 1];
-  if (greatest === undefined) return others;
-  const ofAll = finite(front?.course?.hypervolumes ?? []).at(-1) ?? greatest;
-  const near = volumes.filter((volume) => volume >= (1 - kNear) * ofAll).length;
-  const isSingle = front?.ranks.filter((rank) => rank === 1).length === 1;
+  if (greatest === undefined || !fronts) return others;
+  const { ofAll, near, verdict } = fronts;
   return [
     { text: `The front above is that of all ${counted(all.length, 'repetition')} together. The hypervolumes of ${ended.length === all.length ? 'their own fronts' : `the fronts of the ${count(ended.length)} that ${ended.length === 1 ? 'has' : 'have'} ended with one`}, on its scale: least ${number(volumes[0], 6)}, median ${number(quantile(volumes, 0.5), 6)}, greatest ${number(greatest, 6)}; that of all ${number(ofAll, 6)}.` },
-    ...(ended.length < 2 || !(ofAll > 0) ? [] : isSingle ? [{ text: 'It is a single set, so that there is no trade-off to compare.' }] : [near === ended.length
+    ...(verdict === 'none' ? [] : verdict === 'one set' ? [{ text: `It is a single set, and whatever the seed, the search came within ${percent(kNear)} of its hypervolume, so that there is no trade-off to compare.` }] : [verdict === 'agree'
       ? { kind: 'good' as const, text: `Whatever the seed, the search found nearly the same front: each hypervolume is within ${percent(kNear)} of that of all.` }
       : { kind: 'warning' as const, text: `${count(near)} of ${counted(ended.length, 'repetition')} come within ${percent(kNear)} of the hypervolume of all: the front that a single search finds depends on the seed. A larger budget helps, or taking the front of several repetitions, as here.` }]),
     ...others,
@@ -253,7 +256,7 @@ function frontRepetitions(data: ReportData, repetitions: Repetitions): Section {
     id: 'repetitions',
     title: kTitle,
     content: [
-      findingList(frontFindings(data, repetitions)),
+      findingList(frontFindings(repetitions)),
       table([{ title: 'Repetition' }, { title: 'Seed', number: true }, { title: 'Evaluations', number: true }, { title: 'Hypervolume', number: true },
         { title: 'Compromise', number: true, hint: 'The evaluation' }, { title: 'Why it stopped' }], rows, 'Repetitions'),
       ...(all.length > 1 ? [heading('Spread'), chart(volumePlan(repetitions)),
