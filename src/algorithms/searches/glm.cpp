@@ -341,7 +341,7 @@ std::vector<ParameterSet> Glm::trialSets(GlmLinearModel& model, std::span<const 
   std::vector<ParameterSet> sets;
   for (const double lambda : lambdas) {
     ParameterSet wanted = constraints_.led(
-        [&](std::span<const LinearConstraint> held) { return model.setFor(lambda, held); }, current_->set);
+        [&](std::span<const LinearConstraint> kept) { return model.setFor(lambda, kept); }, current_->set);
     const bool isStopped = !problem_.feasibility.holds(wanted);
     if (isStopped) {
       stoppedBy_ = constraints_.violatedTexts(wanted);

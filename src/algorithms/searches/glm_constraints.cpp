@@ -63,23 +63,21 @@ ParameterSet GlmConstraints::led(const Step& step, std::span<const double> curre
   if (feasibility_.holds(set) || !areAny()) return set;
   const std::vector<LinearConstraint> all = linearised(current);
   std::vector<bool> isTaken(all.size(), false);
-  std::vector<LinearConstraint> held;
+  std::vector<LinearConstraint> kept;
   for (;;) {
     const std::vector<ConstraintMargin> margins = feasibility_.margins(set);
-    const std::size_t before = held.size();
+    const std::size_t before = kept.size();
     for (std::size_t c = 0; c < all.size(); ++c) {
       double expected = all[c].margin;
       for (std::size_t j = 0; j < set.size(); ++j) expected += all[c].normal[j] * (set[j] - current[j]);
       const bool isViolated = std::isnan(margins[c].value) ? expected < 0.0 : margins[c].isViolated();
       if (isTaken[c] || !isViolated || !(extentOf(all[c]) > 0.0)) continue;
       isTaken[c] = true;
-      held.push_back(all[c]);
+      kept.push_back(all[c]);
     }
-    if (held.size() == before) return set;
-    ParameterSet next = movedInside(step(held));
-    const bool isFeasible = feasibility_.holds(next);
-    set = std::move(next);
-    if (isFeasible) return set;
+    if (kept.size() == before) return movedInside(std::move(set));
+    set = step(kept);
+    if (feasibility_.holds(set)) return set;
   }
 }
 

@@ -22,10 +22,10 @@ class GlmConstraints final {
 
   bool areAny() const { return feasibility_.constraintCount() > 0; }
 
-  /// The set that a step leads to while these constraints are held as equations.
-  using Step = std::function<ParameterSet(std::span<const LinearConstraint> held)>;
-  /// The set of the step that holds nothing if that meets the constraints; else those that it violates are held, and so
-  /// on until none is violated any more, or nothing further can be held: then it is not one that can be run.
+  /// The set that a step leads to within these constraints.
+  using Step = std::function<ParameterSet(std::span<const LinearConstraint> kept)>;
+  /// The set of the step that keeps to none if that meets them; else it is made within those that it violates, and so
+  /// on until none is violated any more, or no further one is: then it is not one that can be run.
   ParameterSet led(const Step& step, std::span<const double> current) const;
   /// The set moved to the inner side of the constraints that it violates, by Newton's method; curved ones need it.
   ParameterSet movedInside(ParameterSet set) const;

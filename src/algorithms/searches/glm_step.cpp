@@ -14,18 +14,6 @@ double dot(std::span<const double> a, std::span<const double> b) {
   return sum;
 }
 
-bool isCrossed(const LinearConstraint& constraint, std::span<const double> step, std::span<const double> lengths) {
-  constexpr double kRounding = 1.0e-12;
-  double margin = constraint.margin;
-  double size = std::abs(margin);
-  for (std::size_t j = 0; j < step.size(); ++j) {
-    const double change = lengths[j] > 0.0 ? constraint.normal[j] * step[j] / lengths[j] : 0.0;
-    margin += change;
-    size += std::abs(change);
-  }
-  return margin < -kRounding * size;
-}
-
 }  // namespace
 
 GlmLinearModel::GlmLinearModel(std::vector<std::vector<double>> jacobian, std::span<const double> residuals,
@@ -102,7 +90,7 @@ RowSpace GlmLinearModel::heldRows(const std::vector<bool>& isFree, const std::ve
     std::vector<double> row;
     double rightSide = -constraints[c].margin;
     for (std::size_t j = 0; j < isFree.size(); ++j) {
-      const double slope = lengths_[j] > 0.0 ? constraints[c].normal[j] / lengths_[j] : 0.0;
+      const double slope = slopeOf(constraints[c], j);
       if (isFree[j]) {
         row.push_back(slope);
       } else {
@@ -167,26 +155,130 @@ std::vector<double> GlmLinearModel::balance(std::vector<double>& downhill, const
   for (std::size_t c = 0, place = 0; c < constraints.size(); ++c) {
     if (!isInRows[c]) continue;
     multipliers[c] = found[place++];
-    for (std::size_t j = 0; j < downhill.size(); ++j) {
-      if (lengths_[j] > 0.0) downhill[j] += multipliers[c] * constraints[c].normal[j] / lengths_[j];
-    }
+    for (std::size_t j = 0; j < downhill.size(); ++j) downhill[j] += multipliers[c] * slopeOf(constraints[c], j);
   }
   return multipliers;
 }
 
-std::vector<double> GlmLinearModel::setFor(double lambda, std::span<const LinearConstraint> constraints) {
+/// Where a step from one point towards another first meets a bound or a constraint.
+struct GlmLinearModel::Obstacle {
+  double share = 1.0;  ///< of the way
+  std::optional<std::size_t> parameter;
+  std::optional<std::size_t> constraint;
+  double value = 0.0;  ///< scaled step of the parameter at its bound
+};
+
+GlmLinearModel::Obstacle GlmLinearModel::firstObstacle(std::span<const double> from, std::span<const double> to,
+                                                       const std::vector<bool>& isFree,
+                                                       std::span<const LinearConstraint> constraints,
+                                                       const std::vector<bool>& isHeld) const {
+  constexpr double kRounding = 1.0e-12;
+  Obstacle first;
+  for (std::size_t j = 0; j < from.size(); ++j) {
+    if (!isFree[j]) continue;
+    const double bound = stepTo(j, to[j] < from[j] ? bounds_.lower[j] : bounds_.upper[j]);
+    if (to[j] < from[j] ? to[j] >= bound : to[j] <= bound) continue;
+    const double share = std::max(0.0, (bound - from[j]) / (to[j] - from[j]));
+    if (share < first.share) first = {share, j, std::nullopt, bound};
+  }
+  for (std::size_t c = 0; c < constraints.size(); ++c) {
+    if (isHeld[c]) continue;
+    double margin = constraints[c].margin;
+    double change = 0.0;
+    double size = std::abs(margin);
+    for (std::size_t j = 0; j < from.size(); ++j) {
+      const double slope = slopeOf(constraints[c], j);
+      margin += slope * from[j];
+      change += slope * (to[j] - from[j]);
+      size += std::abs(slope) * (std::abs(from[j]) + std::abs(to[j]));
+    }
+    if (margin + change >= -kRounding * size) continue;
+    const double share = std::max(0.0, -margin / change);
+    if (share < first.share) first = {share, std::nullopt, c, 0.0};
+  }
+  return first;
+}
+
+/// A primal active-set method: the steps within the constraints lead from one obstacle to the next, which is held from
+/// then on, and let go what is not needed where they have come to their end.
+std::vector<double> GlmLinearModel::constrainedSet(double lambda, std::span<const LinearConstraint> constraints) {
+  constexpr double kRounding = 1.0e-10;
   const std::size_t n = set_.size();
-  std::vector<bool> isHeld(constraints.size(), true);
-  std::vector<bool> wasLetGo(constraints.size(), false);
+  std::vector<bool> isFree(n);
+  for (std::size_t j = 0; j < n; ++j) isFree[j] = lengths_[j] > 0.0;
+  std::vector<double> fixed(n, 0.0);
+  std::vector<bool> isHeld(constraints.size(), false);
+  std::vector<double> step(n, 0.0);
+  const std::size_t mostRounds = 20 + 4 * (n + constraints.size());
+  for (std::size_t round = 0; round < mostRounds; ++round) {
+    const RowSpace rows = heldRows(isFree, fixed, constraints, isHeld);
+    const std::vector<double> target =
+        rows.size() == 0 ? stepOf(isFree, fixed, lambda) : stepAlong(rows, isFree, fixed, lambda);
+    const Obstacle obstacle = firstObstacle(step, target, isFree, constraints, isHeld);
+    for (std::size_t j = 0; j < n; ++j) step[j] += obstacle.share * (target[j] - step[j]);
+    if (obstacle.parameter) {
+      isFree[*obstacle.parameter] = false;
+      step[*obstacle.parameter] = fixed[*obstacle.parameter] = obstacle.value;
+      continue;
+    }
+    if (obstacle.constraint) {
+      isHeld[*obstacle.constraint] = true;
+      continue;
+    }
+    // At the minimum of what is free: the multipliers tell what need not be held.
+    std::vector<double> left = system_.rightSide;
+    for (std::size_t j = 0; j < n; ++j) {
+      for (std::size_t i = 0; i < left.size(); ++i) left[i] -= system_.columns[j][i] * step[j];
+    }
+    std::vector<double> downhill(n);
+    for (std::size_t j = 0; j < n; ++j) downhill[j] = dot(system_.columns[j], left) - lambda * step[j];
+    double worst = -kRounding * std::sqrt(dot(downhill, downhill));
+    const std::vector<double> multipliers = balance(downhill, isFree, constraints, isHeld);
+    std::optional<std::size_t> parameter;
+    std::optional<std::size_t> constraint;
+    for (std::size_t c = 0; c < constraints.size(); ++c) {
+      double square = 0.0;
+      for (std::size_t j = 0; j < n; ++j) square += slopeOf(constraints[c], j) * slopeOf(constraints[c], j);
+      if (const double push = multipliers[c] * std::sqrt(square); push < worst) {
+        worst = push;
+        constraint = c;
+      }
+    }
+    for (std::size_t j = 0; j < n; ++j) {
+      if (isFree[j] || !(lengths_[j] > 0.0)) continue;
+      const double push = fixed[j] == stepTo(j, bounds_.lower[j]) ? -downhill[j] : downhill[j];
+      if (!(push < worst)) continue;
+      worst = push;
+      parameter = j;
+    }
+    if (!parameter && !constraint) break;
+    if (parameter) {
+      isFree[*parameter] = true;
+      fixed[*parameter] = 0.0;
+    } else {
+      isHeld[*constraint] = false;
+    }
+  }
+  std::vector<double> found(n);
+  for (std::size_t j = 0; j < n; ++j) {
+    const double value = lengths_[j] > 0.0 ? set_[j] + step[j] / lengths_[j] : set_[j];
+    found[j] = std::clamp(value, bounds_.lower[j], bounds_.upper[j]);
+    if (isFree[j] || !(lengths_[j] > 0.0)) continue;
+    found[j] = fixed[j] == stepTo(j, bounds_.lower[j]) ? bounds_.lower[j] : bounds_.upper[j];
+  }
+  return found;
+}
+
+std::vector<double> GlmLinearModel::setFor(double lambda, std::span<const LinearConstraint> constraints) {
+  if (!constraints.empty()) return constrainedSet(lambda, constraints);
+  const std::size_t n = set_.size();
   std::vector<bool> isFree(n);
   std::vector<bool> wasFreed(n, false);
   for (std::size_t j = 0; j < n; ++j) isFree[j] = lengths_[j] > 0.0;
   std::vector<double> fixed(n, 0.0);
   std::vector<double> step;
   for (;;) {
-    std::vector<bool> isInRows = isHeld;
-    const RowSpace rows = heldRows(isFree, fixed, constraints, isInRows);
-    step = rows.size() == 0 ? stepOf(isFree, fixed, lambda) : stepAlong(rows, isFree, fixed, lambda);
+    step = stepOf(isFree, fixed, lambda);
     bool hasLeft = false;
     for (std::size_t j = 0; j < n; ++j) {
       if (!isFree[j]) continue;
@@ -197,36 +289,17 @@ std::vector<double> GlmLinearModel::setFor(double lambda, std::span<const Linear
       fixed[j] = step[j] < low ? low : high;
       hasLeft = true;
     }
-    for (std::size_t c = 0; c < constraints.size(); ++c) {
-      if (isHeld[c] || !isCrossed(constraints[c], step, lengths_)) continue;
-      isHeld[c] = true;
-      hasLeft = true;
-    }
     if (hasLeft) continue;
     // The gradient of the damped sum of squares by the scaled step.
     std::vector<double> left = system_.rightSide;
     for (std::size_t j = 0; j < n; ++j) {
       for (std::size_t i = 0; i < left.size(); ++i) left[i] -= system_.columns[j][i] * step[j];
     }
-    std::vector<double> downhill(n);
-    for (std::size_t j = 0; j < n; ++j) downhill[j] = dot(system_.columns[j], left) - lambda * step[j];
-    if (rows.size() > 0) {
-      const std::vector<double> multipliers = balance(downhill, isFree, constraints, isInRows);
-      std::optional<std::size_t> worst;
-      for (std::size_t c = 0; c < multipliers.size(); ++c) {
-        if (wasLetGo[c] || !(multipliers[c] < 0.0)) continue;
-        if (!worst || multipliers[c] < multipliers[*worst]) worst = c;
-      }
-      if (worst) {
-        isHeld[*worst] = false;
-        wasLetGo[*worst] = true;
-        continue;
-      }
-    }
     for (std::size_t j = 0; j < n && !hasLeft; ++j) {
       if (isFree[j] || wasFreed[j] || !(lengths_[j] > 0.0)) continue;
+      const double downhill = dot(system_.columns[j], left) - lambda * step[j];
       const bool isAtLower = fixed[j] == stepTo(j, bounds_.lower[j]);
-      if (isAtLower ? !(downhill[j] > 0.0) : !(downhill[j] < 0.0)) continue;
+      if (isAtLower ? !(downhill > 0.0) : !(downhill < 0.0)) continue;
       isFree[j] = true;
       wasFreed[j] = true;
       fixed[j] = 0.0;

