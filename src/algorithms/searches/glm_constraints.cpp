@@ -21,6 +21,7 @@ constexpr double kInside = 1.0e-14;
 std::vector<LinearConstraint> GlmConstraints::linearised(std::span<const double> set) const {
   std::vector<LinearConstraint> found;
   const std::vector<ConstraintMargin> here = feasibility_.margins(set);
+  found.reserve(here.size());
   for (const ConstraintMargin& margin : here) {
     found.push_back({std::vector<double>(set.size(), 0.0), margin.value});
   }

@@ -340,6 +340,7 @@ std::vector<double> GlmLinearModel::correctedSet(double lambda, std::span<const 
   }
   if (rows.size() > 0) {
     std::vector<double> along;
+    along.reserve(directions.size());
     for (const std::vector<double>& direction : directions) along.push_back(dot(direction, products));
     products = std::move(along);
   }
