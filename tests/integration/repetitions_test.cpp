@@ -183,7 +183,7 @@ TEST_F(Repeated, TheLimitsOfGlmAreThoseOfTheBestRepetition) {
 }
 
 TEST_F(Repeated, MoreOfThemCanFollowAndNothingElseCanBeRaised) {
-  const RunSettings settings{.algorithm = 1, .maxEvaluations = 50, .restart = 1};
+  const RunSettings settings{.algorithm = 1, .maxEvaluations = 20, .restart = 1};
   const RunSettings ofFronts{.search = "PADDS", .maxEvaluations = 20, .restart = 1};
   for (const auto& [of, before, cutAt] :
        {std::tuple(ofFronts, 1, ""), std::tuple(ofFronts, 2, "\n25\t"), std::tuple(settings, 1, ""),
