@@ -1,13 +1,26 @@
 #pragma once
 
+#include <cstddef>
 #include <functional>
+#include <limits>
 #include <optional>
 #include <span>
 #include <string>
 #include <string_view>
 #include <utility>
+#include <vector>
 
 namespace mirevo {
+
+/// How a constraint stands at a set.
+struct ConstraintMargin {
+  /// The difference of its sides, below 0 where it is violated; NaN where a side has no finite value.
+  double value = std::numeric_limits<double>::quiet_NaN();
+  double size = 0.0;  ///< of both sides
+  bool isStrict = false;
+
+  bool isViolated() const { return value < 0.0 || (isStrict && value == 0.0); }
+};
 
 /// Tells before its evaluation whether a parameter set (search scale) can be run: whether it meets the constraints and
 /// all equations have a value. Without a test, for a model without constraints and dependent parameters, nothing is
@@ -22,6 +35,20 @@ class Feasibility final {
   using Amount = std::function<double(std::span<const double> set)>;
   explicit Feasibility(Test test, bool hasConstraints = true, Amount amount = {})
       : test_(std::move(test)), hasConstraints_(hasConstraints), amount_(std::move(amount)) {}
+
+  /// The margins of all constraints at a set.
+  using Margins = std::function<std::vector<ConstraintMargin>(std::span<const double> set)>;
+  /// `texts`: each constraint for people, "constraint 1 (a + b <= 2)".
+  void setMargins(Margins margins, std::vector<std::string> texts) {
+    margins_ = std::move(margins);
+    texts_ = std::move(texts);
+  }
+  /// Of which the margins are known.
+  std::size_t constraintCount() const { return texts_.size(); }
+  const std::string& constraintText(std::size_t c) const { return texts_[c]; }
+  std::vector<ConstraintMargin> margins(std::span<const double> set) const {
+    return margins_ ? margins_(set) : std::vector<ConstraintMargin>();
+  }
 
   bool isTested() const { return test_ != nullptr; }
   std::optional<std::string> violation(std::span<const double> set) const { return test_ ? test_(set) : std::nullopt; }
@@ -41,6 +68,8 @@ class Feasibility final {
   Test test_;
   bool hasConstraints_ = true;
   Amount amount_;
+  Margins margins_;
+  std::vector<std::string> texts_;
 };
 
 }  // namespace mirevo

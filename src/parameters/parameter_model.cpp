@@ -55,6 +55,9 @@ class ParameterModel::Implementation {
   std::optional<ParameterFailure> assignDependentParameters();
   std::optional<ParameterFailure> checkConstraints() const;
   double violationAmount() const;
+  std::vector<ConstraintMargin> margins() const;
+  std::vector<std::string> constraintTexts() const;
+  std::size_t constraintCount() const { return constraints_.size(); }
   bool hasConstraints() const { return !constraints_.empty(); }
   bool hasEquations() const {
     return std::any_of(equations_.begin(), equations_.end(), [](const auto& equation) { return equation != nullptr; });
@@ -191,6 +194,33 @@ double ParameterModel::Implementation::violationAmount() const {
   return sum > 0.0 ? sum : std::numeric_limits<double>::infinity();
 }
 
+std::vector<ConstraintMargin> ParameterModel::Implementation::margins() const {
+  std::vector<ConstraintMargin> found;
+  for (const CompiledConstraint& compiled : constraints_) {
+    const double left = valueOf(*compiled.left, compiled.constraint.leftEquation);
+    const double right = valueOf(*compiled.right, compiled.constraint.rightEquation);
+    const LogicalOperator kind = compiled.constraint.logicalOperator;
+    const bool isBelow = kind == LogicalOperator::less || kind == LogicalOperator::lessOrEqual;
+    const double value = isBelow ? right - left : left - right;
+    ConstraintMargin& margin = found.emplace_back();
+    margin.isStrict = kind == LogicalOperator::less || kind == LogicalOperator::greater;
+    margin.size = std::abs(left) + std::abs(right);
+    if (std::isfinite(value)) margin.value = value;
+  }
+  return found;
+}
+
+std::vector<std::string> ParameterModel::Implementation::constraintTexts() const {
+  std::vector<std::string> texts;
+  for (std::size_t c = 0; c < constraints_.size(); ++c) {
+    const InternalConstraint& constraint = constraints_[c].constraint;
+    texts.push_back(fmt::format("constraint {} ({} {} {})", c + 1, trim(constraint.leftEquation),
+                                codeName(kLogicalOperatorNames, constraint.logicalOperator),
+                                trim(constraint.rightEquation)));
+  }
+  return texts;
+}
+
 ParameterModel::ParameterModel(std::vector<ModelParameter> parameters, std::vector<InternalConstraint> constraints) {
   if (parameters.empty()) fatalError("Error: No model parameters defined");
   implementation_ = std::make_unique<Implementation>(std::move(parameters), std::move(constraints));
@@ -220,7 +250,7 @@ std::variant<std::span<const double>, ParameterFailure> ParameterModel::MapToMod
 Feasibility ParameterModel::feasibility() {
   const bool hasConstraints = implementation_->hasConstraints();
   if (!hasConstraints && !implementation_->hasEquations()) return {};
-  return Feasibility(
+  Feasibility feasibility(
       [this](std::span<const double> set) -> std::optional<std::string> {
         const auto mapped = MapToModelValues(set);
         const auto* failure = std::get_if<ParameterFailure>(&mapped);
@@ -234,6 +264,16 @@ Feasibility ParameterModel::feasibility() {
         return failure->kind == ParameterFailure::Kind::constraintViolated ? implementation_->violationAmount()
                                                                            : std::numeric_limits<double>::infinity();
       });
+  feasibility.setMargins(
+      [this](std::span<const double> set) {
+        implementation_->assignVariableParameters(set);
+        implementation_->assignFixedParameters();
+        const bool isDefined = !implementation_->assignDependentParameters();
+        return isDefined ? implementation_->margins()
+                         : std::vector<ConstraintMargin>(implementation_->constraintCount());
+      },
+      implementation_->constraintTexts());
+  return feasibility;
 }
 
 std::vector<double> allModelValues(ParameterModel& model, std::span<const double> variable) {

@@ -13,6 +13,7 @@ namespace mirevo::testing {
 namespace {
 
 using ::testing::AllOf;
+using ::testing::AnyOf;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
@@ -92,10 +93,6 @@ TEST_F(GlmRun, OfAnInterruptedRunTellsTheCovarianceAndARestartGoesOn) {
       EXPECT_THAT(folder_.read(kTables[0]), HasSubstr("# Unfinished run"));
     }
     std::filesystem::remove(folder_ / "hold");
-    folder_.editSetup("Restart = 0", "Restart = 1");
-    ASSERT_EQ(runProgram({setup_}).exitCode, 0) << log();
-    EXPECT_THAT(log(), HasSubstr(fmt::format("Restart: {} evaluations are taken from", rows)));
-    EXPECT_EQ(files(), expected);
   }
 }
 
@@ -123,6 +120,36 @@ TEST_F(GlmRun, KeepsTheSeriesOfItsBestSetThoughAnotherHasTheLeastAggregate) {
     EXPECT_EQ(best.rows.size(), 365U);
     EXPECT_FALSE(std::isnan(realCell(best.rows.front()[best.column("Best").value()]).value()));
     removeFiles();
+  }
+}
+
+/// The best set, a = 5 and b = 2, is cut off.
+TEST_F(GlmRun, GoesAlongAConstraintAndTellsThatTheLimitsTakeNoAccountOfIt) {
+  writeSetup();
+  folder_.editSetup(
+      "TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+      "TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n        Left_Equation = 'a + b'\n        "
+      "Right_Equation = '6.5'\n        Logical_Operator = 1\n      [/CONSTRAINT_1]\n    [/INTERNAL_CONSTRAINTS]");
+  const ProgramResult run = runProgram({setup_});
+  ASSERT_EQ(run.exitCode, 0) << run.error << log();
+  EXPECT_THAT(log(), AllOf(HasSubstr("The estimate lies at constraint 1 (a + b <= 6.5)\n"),
+                           HasSubstr("Warning: The estimate lies at constraint 1 (a + b <= 6.5), of which covariance, "
+                                     "correlation and limits take no account")));
+  EXPECT_THAT(log(), Not(HasSubstr("FAILED")));
+}
+
+TEST_F(GlmRun, WithoutARunToStartFromIsAnError) {
+  folder_.useScript("exit 3");
+  for (const int restart : {0, 1}) {
+    setup_ = folder_.writeSetup({.search = "GLM", .maxEvaluations = restart == 0 ? 60 : 80, .restart = restart});
+    const ProgramResult run = runProgram({setup_});
+    EXPECT_EQ(run.exitCode, 1);
+    EXPECT_THAT(run.error, AllOf(HasSubstr("Error: No model run of the initial sample of GLM succeeded"),
+                                 HasSubstr("the first of them, evaluation 1: run.sh exited with code 3")));
+    EXPECT_THAT(log(), Not(AnyOf(HasSubstr("Best parameter set"), HasSubstr("Final model run"),
+                                 HasSubstr("Normal termination"))));
+    EXPECT_THAT(folder_.read("basin_Optimisation.dat"), HasSubstr("\n6\tFAILED\t"));
+    EXPECT_EQ(log().find("6 evaluations are taken from") != std::string::npos, restart == 1) << log();
   }
 }
 
@@ -155,6 +182,18 @@ TEST_F(GlmRun, IsCheckedBeforeItRuns) {
       EXPECT_EQ(refused.exitCode, 1) << each.to;
       EXPECT_THAT(refused.error, AllOf(HasSubstr(each.expected), HasSubstr("basin.kdx:"))) << each.to;
     }
+  }
+  const std::pair<const char*, const char*> warnings[] = {
+      {"Starts = 4\nPrior_Values = 4, 1", "Prior_Values: has no effect with Regularisation = 0"},
+      {"Starts = 4\nPrior_Weights = 1, 1", "Prior_Weights: has no effect with Regularisation = 0"},
+      {"Starts = 4\nRegularisation = 1\nPrior_Values = 4, 1000",
+       "Prior_Values: outside the bounds, towards which the estimates are drawn: 1000 of b"}};
+  for (const auto& [to, expected] : warnings) {
+    folder_.write("basin.kdx", sound);
+    folder_.editSetup("Starts = 4", to);
+    const ProgramResult doubted = runProgram({"--check", setup_});
+    EXPECT_EQ(doubted.exitCode, 0) << doubted.error;
+    EXPECT_THAT(doubted.error + doubted.output, HasSubstr(expected));
   }
 }
 

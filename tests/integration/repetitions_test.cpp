@@ -133,6 +133,25 @@ TEST_F(Repeated, ARunThatWasCutOffAnywhereGoesOnToTheSameFiles) {
   }
 }
 
+/// The samples of the first repetition fail, those of the second do not; then all fail.
+TEST_F(Repeated, OfGlmWithoutARunToStartFromIsToldAndAnErrorIfAllAre) {
+  const RunSettings settings{.search = "GLM", .includesInitial = false, .maxEvaluations = 50};
+  writeSetup(settings, 2, "");
+  folder_.useScript(
+      "n=1; until test $n -gt 4 || mkdir ../tickets/$n; do n=$((n + 1)); done 2>/dev/null\ntest $n -gt 4 || exit 3");
+  std::filesystem::create_directory(folder_ / "tickets");
+  const ProgramResult run = runProgram({setup_});
+  EXPECT_EQ(run.exitCode, 0) << run.error;
+  EXPECT_THAT(log(), HasSubstr("Warning: No model run of the initial sample of GLM succeeded: 4 evaluations made"));
+  EXPECT_THAT(log(), HasSubstr("Best parameter set"));
+
+  folder_.useScript("exit 3");
+  const ProgramResult none = runProgram({setup_});
+  EXPECT_EQ(none.exitCode, 1);
+  EXPECT_THAT(none.error, HasSubstr("Error: No model run of the initial sample of GLM succeeded"));
+  EXPECT_THAT(log(), Not(HasSubstr("Best parameter set")));
+}
+
 TEST_F(Repeated, TheLimitsOfGlmAreThoseOfTheBestRepetition) {
   writeSetup({.search = "GLM", .includesInitial = false, .maxEvaluations = 14}, 3, kInSideBySideOrder);
   runToEnd();

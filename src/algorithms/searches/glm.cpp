@@ -27,12 +27,21 @@ constexpr double kNearOptimum = 0.1;
 constexpr double kPoorGain = 0.25;
 /// Iterations in a row that must gain less than Min_Change.
 constexpr int kSmallChanges = 2;
+/// And such iterations whose steps constraints have stopped, after which the run ends without having converged.
+constexpr int kStoppedChanges = 5;
 constexpr double kLeastLambda = 1.0e-10;
+constexpr std::string_view kStopped = "constraints stop its steps, which need not be a minimum";
 
 double sumOfSquares(std::span<const double> values) {
   double sum = 0.0;
   for (const double value : values) sum += value * value;
   return sum;
+}
+
+std::string failureText(const EvaluationResult& result) {
+  std::string text = fmt::format("evaluation {}: {}", result.number, result.failure->reason);
+  for (const std::string& line : result.failure->lastOutput) text += "\n| " + line;
+  return text;
 }
 
 /// The sets that the initial sample has: those given, and as many as are to be drawn.
@@ -45,7 +54,10 @@ std::size_t sampleCount(const GlmSettings& settings, const InitialSampleSettings
 }  // namespace
 
 Glm::Glm(const GlmSettings& settings, SearchProblem problem)
-    : settings_(settings), problem_(std::move(problem)), feasible_(problem_.feasibility) {}
+    : settings_(settings),
+      problem_(std::move(problem)),
+      feasible_(problem_.feasibility),
+      constraints_(problem_.feasibility, problem_.bounds) {}
 
 bool Glm::isProblemValid() const {
   const SearchBounds& b = problem_.bounds;
@@ -93,10 +105,19 @@ std::vector<std::optional<Glm::Point>> Glm::run(std::span<const ParameterSet> se
       summary_.best = sets[i];
       summary_.bestResult = results[i];
     }
-    if (!results[i].ok()) continue;
+    if (!results[i].ok()) {
+      if (firstFailure_.empty()) firstFailure_ = failureText(results[i]);
+      continue;
+    }
     ResidualRows rows = problem_.residuals->residualsOf(results[i]);
     results[i].simulatedValues = {};
-    if (!std::ranges::all_of(rows.values, [](double value) { return std::isfinite(value); })) continue;
+    if (!std::ranges::all_of(rows.values, [](double value) { return std::isfinite(value); })) {
+      if (firstFailure_.empty()) {
+        firstFailure_ =
+            fmt::format("evaluation {} succeeded, but not all of its residuals are known", results[i].number);
+      }
+      continue;
+    }
     units_.resize(rows.units.size(), std::numeric_limits<double>::infinity());
     for (std::size_t k = 0; k < units_.size(); ++k) units_[k] = std::min(units_[k], rows.units[k]);
     const double squares = sumOfSquares(rows.values);
@@ -127,6 +148,9 @@ SearchStatus Glm::initialise() {
   std::stable_sort(starts_.begin(), starts_.end(), [](const Point& a, const Point& b) { return a.sum < b.sum; });
   starts_.resize(std::min(starts_.size(), static_cast<std::size_t>(settings_.startCount)));
   if (starts_.empty()) {
+    summary_.failure = "No model run of the initial sample of GLM succeeded";
+    summary_.failureDetail = fmt::format("{} made, none of which has residuals to start from; the first of them, {}",
+                                         countText(sample.size(), "evaluation"), firstFailure_);
     end("Optimisation terminated: No model run of the initial sample succeeded");
   } else if (budgetLeft() <= 0) {
     end(std::string(kBudgetUsedMessage));
@@ -145,7 +169,7 @@ void Glm::startNext() {
   differences_.reset();
   needsJacobian_ = true;
   isCentral_ = settings_.differences == GlmDifferences::central;
-  updates_ = smallChanges_ = iteration_ = 0;
+  updates_ = smallChanges_ = stoppedChanges_ = iteration_ = 0;
   lambda_ = settings_.initialLambda;
   ++runCount_;
   note(fmt::format("Run {} of GLM starts from evaluation {}: sum of squares {}", runCount_, current_->result.number,
@@ -176,6 +200,9 @@ void Glm::end(std::string message) {
     note(fmt::format("The estimate of {} is at its {} bound", problem_.residuals->space.names[j],
                      isAtLower ? "lower" : "upper"));
   }
+  for (const std::string& constraint : best_ ? constraints_.holdingTexts(best_->set) : std::vector<std::string>()) {
+    note(fmt::format("The estimate lies at {}", constraint));
+  }
   if (best_ && runCount_ > 0 && best_->sum < leastOfRuns_) {
     note(fmt::format(
         "The best set, evaluation {}, is one of the differences: sum of squares {}, {:.3g} % less than where "
@@ -188,6 +215,11 @@ void Glm::end(std::string message) {
 void Glm::endRun(std::string_view reason) {
   note(fmt::format("Run {} of GLM ended after {}, as {}: sum of squares {}", runCount_,
                    countText(static_cast<std::size_t>(iteration_), "iteration"), reason, formatReal(current_->sum)));
+  if (reason == kStopped) {
+    std::string names;
+    for (const std::string& name : stoppedBy_) names += (names.empty() ? "" : ", ") + name;
+    note("Its last trial sets were stopped by " + names);
+  }
   if (!starts_.empty()) {
     startNext();
   } else {
@@ -285,7 +317,13 @@ GlmLinearModel Glm::linearModel() const {
   for (std::size_t j = 0; j < columns.size(); ++j) {  // also by the prior
     if (sumOfSquares(jacobian_[j]) == 0.0 && !differences_->problems[j].empty()) std::ranges::fill(columns[j], 0.0);
   }
-  return {std::move(columns), residuals, current_->set, b, settings_.smallestSingularValue};
+  GlmLinearModel model(std::move(columns), residuals, current_->set, b, settings_.smallestSingularValue);
+  if (constraints_.areAny()) {
+    std::vector<bool> isKnown;
+    for (const std::string& problem : differences_->problems) isKnown.push_back(problem.empty());
+    model.freeUnseen(isKnown);
+  }
+  return model;
 }
 
 /// First 0 and those around the last good one, then ever larger ones.
@@ -308,13 +346,20 @@ std::vector<double> Glm::lambdas(int attempt) const {
 
 /// One set for each lambda, but for those that others have led to.
 std::vector<ParameterSet> Glm::trialSets(GlmLinearModel& model, std::span<const double> lambdas,
-                                         std::vector<double>& used) {
+                                         std::vector<Trial>& trials) {
   std::vector<ParameterSet> sets;
   for (const double lambda : lambdas) {
-    ParameterSet set = feasible_.drawnBack(model.setFor(lambda), {current_->set});
+    ParameterSet wanted = constraints_.led(
+        [&](std::span<const LinearConstraint> kept) { return model.setFor(lambda, kept); }, current_->set);
+    const bool isStopped = !problem_.feasibility.holds(wanted);
+    if (isStopped) {
+      stoppedBy_ = constraints_.violatedTexts(wanted);
+      if (stoppedBy_.empty()) stoppedBy_.emplace_back("equations without a finite value");
+    }
+    ParameterSet set = feasible_.drawnBack(std::move(wanted), {current_->set});
     if (set == current_->set || std::ranges::find(sets, set) != sets.end()) continue;
     sets.push_back(std::move(set));
-    used.push_back(lambda);
+    trials.push_back({lambda, isStopped});
   }
   return sets;
 }
@@ -329,14 +374,15 @@ SearchStatus Glm::advance() {
     end(std::string(kBudgetUsedMessage));
     return kSearchOk;
   }
+  stoppedBy_.clear();
   GlmLinearModel model = linearModel();
-  if (model.largestCosine() < settings_.minGradient) {
+  if (model.largestCosine(constraints_.holding(current_->set)) < settings_.minGradient) {
     refineOr("the gradient is negligible");
     return kSearchOk;
   }
   for (int attempt = 0; attempt < kMostAttempts; ++attempt) {
-    std::vector<double> used;
-    const std::vector<ParameterSet> sets = trialSets(model, lambdas(attempt), used);
+    std::vector<Trial> trials;
+    const std::vector<ParameterSet> sets = trialSets(model, lambdas(attempt), trials);
     std::vector<std::optional<Point>> points = run(sets);
     const bool isCut = points.size() < sets.size();
     const auto bestOf = [&] {
@@ -350,19 +396,20 @@ SearchStatus Glm::advance() {
     const double gain = best ? current_->sum - points[*best]->sum : 0.0;
     if (attempt == 0 && !isCut && !sets.empty() && gain < kNearOptimum * current_->sum &&
         gain < kPoorGain * (current_->sum - model.sumOfSquaresAt(sets.front()))) {
-      correctTrials(model, points, used);
+      correctTrials(model, points, trials);
       best = bestOf();
     }
     if (best) {
       const double expected = current_->sum - model.sumOfSquaresAt(points[*best]->set);
-      accept(*std::move(points[*best]), used[*best], expected);
+      accept(*std::move(points[*best]), trials[*best], expected);
     }
     if (isCut || budgetLeft() <= 0) {
       if (!isTerminated()) end(std::string(kBudgetUsedMessage));
       return kSearchOk;
     }
     if (best) return kSearchOk;
-    const bool isUndamped = attempt == 0 && !points.empty() && used.front() == 0.0;
+    const bool isUndamped =
+        attempt == 0 && !points.empty() && trials.front().lambda == 0.0 && !trials.front().isStopped;
     if (isUndamped && updates_ == 0 && isLastKind() && points.front() && isLevelWith(*points.front())) {
       takeLevel(*std::move(points.front()));
       endRun("the step to the minimum changes the sum of squares by no more than its rounding");
@@ -370,13 +417,13 @@ SearchStatus Glm::advance() {
     }
   }
   note(fmt::format("Iteration {}: no step reduces the sum of squares", iteration_));
-  refineOr("no step reduces the sum of squares any further");
+  refineOr(stoppedBy_.empty() ? "no step reduces the sum of squares any further" : kStopped);
   return kSearchOk;
 }
 
-void Glm::correctTrials(GlmLinearModel& model, std::vector<std::optional<Point>>& points, std::vector<double>& used) {
+void Glm::correctTrials(GlmLinearModel& model, std::vector<std::optional<Point>>& points, std::vector<Trial>& trials) {
   std::vector<ParameterSet> sets;
-  std::vector<double> lambdas;
+  std::vector<Trial> corrections;
   for (std::size_t i = 0; i < points.size(); ++i) {
     if (!points[i]) continue;
     std::vector<double> lack = points[i]->rows.values;
@@ -385,16 +432,19 @@ void Glm::correctTrials(GlmLinearModel& model, std::vector<std::optional<Point>>
       const double change = points[i]->set[j] - current_->set[j];
       for (std::size_t k = 0; k < lack.size(); ++k) lack[k] -= jacobian_[j][k] * change;
     }
-    ParameterSet set =
-        feasible_.drawnBack(model.correctedSet(used[i], points[i]->set, jacobian_, lack), {current_->set});
+    const double lambda = trials[i].lambda;
+    ParameterSet wanted = constraints_.movedInside(
+        model.correctedSet(lambda, points[i]->set, jacobian_, lack, constraints_.holding(points[i]->set)));
+    const bool isStopped = trials[i].isStopped || !problem_.feasibility.holds(wanted);
+    ParameterSet set = feasible_.drawnBack(std::move(wanted), {current_->set});
     if (set == points[i]->set || set == current_->set || std::ranges::find(sets, set) != sets.end()) continue;
     sets.push_back(std::move(set));
-    lambdas.push_back(used[i]);
+    corrections.push_back({lambda, isStopped});
   }
   std::vector<std::optional<Point>> corrected = run(sets);
   for (std::size_t i = 0; i < corrected.size(); ++i) {
     points.push_back(std::move(corrected[i]));
-    used.push_back(lambdas[i]);
+    trials.push_back(corrections[i]);
   }
 }
 
@@ -417,7 +467,7 @@ void Glm::takeLevel(Point point) {
 }
 
 void Glm::refineOr(std::string_view end) {
-  smallChanges_ = 0;
+  smallChanges_ = stoppedChanges_ = 0;
   if (updates_ > 0) {
     needsJacobian_ = true;
   } else if (settings_.differences == GlmDifferences::automatic && !isCentral_) {
@@ -429,7 +479,7 @@ void Glm::refineOr(std::string_view end) {
   lambda_ = settings_.initialLambda;
 }
 
-void Glm::accept(Point point, double lambda, double expected) {
+void Glm::accept(Point point, const Trial& trial, double expected) {
   const double reduction = current_->sum - point.sum;
   const double share = reduction / current_->sum;
   const SearchBounds& b = problem_.bounds;
@@ -453,26 +503,37 @@ void Glm::accept(Point point, double lambda, double expected) {
     const bool isHeld = !differences_->problems[j].empty();
     for (std::size_t i = 0; !isHeld && i < unexplained.size(); ++i) jacobian_[j][i] += factor * unexplained[i];
   }
-  note(fmt::format("Iteration {}: {} ({}), lambda {}, sum of squares {}, {:.3g} % less", iteration_,
+  note(fmt::format("Iteration {}: {} ({}), lambda {}, sum of squares {}, {:.3g} % less{}", iteration_,
                    countText(static_cast<std::size_t>(summary_.evaluationCount - madeBefore_), "model run"),
                    updates_ > 0 || differences_->evaluation != current_->result.number ? "derivatives after Broyden"
                    : isCentral_                                                        ? "central differences"
                                                                                        : "forward differences",
-                   formatReal(lambda), formatReal(point.sum), 100.0 * share));
+                   formatReal(trial.lambda), formatReal(point.sum), 100.0 * share,
+                   trial.isStopped ? ", where constraints stop the step" : ""));
   noteBest(point);
   current_ = std::move(point);
   leastOfRuns_ = std::min(leastOfRuns_, current_->sum);
-  lambda_ = std::max(kLeastLambda, lambda > 0.0 ? lambda : lambda_ / 10.0);
-  judge(share, largest, reduction > kPoorGain * expected);
+  lambda_ = std::max(kLeastLambda, trial.lambda > 0.0 ? trial.lambda : lambda_ / 10.0);
+  judge(share, largest, reduction > kPoorGain * expected, trial.isStopped);
 }
 
 /// What an accepted step leads to.
-void Glm::judge(double reduction, double step, bool isAsExpected) {
+void Glm::judge(double reduction, double step, bool isAsExpected, bool isStopped) {
   if (!(current_->sum > 0.0)) {
     endRun("the sum of squares is 0");
     return;
   }
-  smallChanges_ = reduction < problem_.stopping.minChange ? smallChanges_ + 1 : 0;
+  const bool isSmall = reduction < problem_.stopping.minChange;
+  if (isStopped) {  // its length tells nothing of a minimum
+    ++updates_;
+    needsJacobian_ = updates_ > settings_.broydenUpdates || !isAsExpected;
+    smallChanges_ = 0;
+    stoppedChanges_ = isSmall || step < settings_.minStep ? stoppedChanges_ + 1 : 0;
+    if (stoppedChanges_ >= kStoppedChanges) refineOr(kStopped);
+    return;
+  }
+  stoppedChanges_ = 0;
+  smallChanges_ = isSmall ? smallChanges_ + 1 : 0;
   const bool isFresh = updates_ == 0;
   ++updates_;
   needsJacobian_ = updates_ > settings_.broydenUpdates || !isAsExpected;
@@ -519,6 +580,27 @@ std::optional<SettingRefusal> GlmMethod::refusalFor(const SearchSpace& space) co
                           fmt::format("expected weights of 0 or more, found {}", formatReal(weight))};
   }
   return std::nullopt;
+}
+
+std::vector<SearchDoubt> GlmMethod::doubts() const {
+  std::vector<SearchDoubt> found;
+  if (settings.regularisation > 0.0) return found;
+  if (!settings.priorValues.empty()) found.push_back({"Prior_Values", "has no effect with Regularisation = 0"});
+  if (!settings.priorWeights.empty()) found.push_back({"Prior_Weights", "has no effect with Regularisation = 0"});
+  return found;
+}
+
+std::vector<SearchDoubt> GlmMethod::doubtsIn(const SearchSpace& space) const {
+  std::string outside;
+  for (std::size_t j = 0; settings.regularisation > 0.0 && j < settings.priorValues.size(); ++j) {
+    const double value = settings.priorValues[j];
+    const bool isLogarithmic = space.transformation[j] == TransformationType::logarithmic;
+    const double scaled = isLogarithmic ? std::log(value) : value;
+    if (scaled >= space.lower[j] && scaled <= space.upper[j]) continue;
+    outside += fmt::format("{}{} of {}", outside.empty() ? "" : ", ", formatReal(value), space.names[j]);
+  }
+  if (outside.empty()) return {};
+  return {{"Prior_Values", "outside the bounds, towards which the estimates are drawn: " + outside}};
 }
 
 std::int64_t GlmMethod::sampleSize(const InitialSampleSettings& sample, int /*budget*/) const {

@@ -11,6 +11,7 @@
 
 #include "algorithms/analyses/perturbation_plan.h"
 #include "algorithms/searches/feasible_points.h"
+#include "algorithms/searches/glm_constraints.h"
 #include "algorithms/searches/residual_problem.h"
 #include "algorithms/searches/search_algorithm.h"
 #include "algorithms/searches/search_method.h"
@@ -44,10 +45,10 @@ struct GlmSettings {
 /// lambdas, of which the best is taken; the first trial has lambda 0. If they gain far less than the linear model
 /// expects, as in a valley that bends, a third batch has the trial sets corrected for the curvature that their runs
 /// have shown (after the geodesic acceleration of Transtrum and Sethna 2012, arXiv:1201.5885). The steps are those of
-/// GlmLinearModel; between Jacobians made by differences they may be updated after Broyden (1965),
-/// doi:10.1090/S0025-5718-1965-0198670-6. A run that lacks a residual of the start counts as failed. A column without a
-/// run is that of the previous Jacobian, updated after Broyden; without one its parameter is held. The best set is that
-/// of the least sum of squares, prior included, be it one of the differences.
+/// GlmLinearModel, led along constraints by GlmConstraints; between Jacobians made by differences they may be updated
+/// after Broyden (1965), doi:10.1090/S0025-5718-1965-0198670-6. A run that lacks a residual of the start counts as
+/// failed. A column without a run is that of the previous Jacobian, updated after Broyden; without one its parameter is
+/// held. The best set is that of the least sum of squares, prior included, be it one of the differences.
 class Glm final : public SearchAlgorithm {
  public:
   Glm(const GlmSettings& settings, SearchProblem problem);
@@ -68,6 +69,12 @@ class Glm final : public SearchAlgorithm {
     double sum = 0.0;      ///< with the prior
   };
 
+  /// How a trial set was made.
+  struct Trial {
+    double lambda = 0.0;
+    bool isStopped = false;  ///< drawn back towards the current set, as constraints stop its step
+  };
+
   bool isProblemValid() const;
   /// Fewer results than sets if the budget is used up.
   std::vector<std::optional<Point>> run(std::span<const ParameterSet> sets);
@@ -76,11 +83,11 @@ class Glm final : public SearchAlgorithm {
   GlmLinearModel linearModel() const;
   std::vector<double> lambdas(int attempt) const;
   std::vector<ParameterSet> trialSets(GlmLinearModel& model, std::span<const double> lambdas,
-                                      std::vector<double>& used);
+                                      std::vector<Trial>& trials);
   /// Runs the trial sets again, corrected for the curvature that they have shown. May replace the best of them.
-  void correctTrials(GlmLinearModel& model, std::vector<std::optional<Point>>& points, std::vector<double>& used);
-  void accept(Point point, double lambda, double expected);
-  void judge(double reduction, double step, bool isAsExpected);
+  void correctTrials(GlmLinearModel& model, std::vector<std::optional<Point>>& points, std::vector<Trial>& trials);
+  void accept(Point point, const Trial& trial, double expected);
+  void judge(double reduction, double step, bool isAsExpected, bool isStopped);
   bool isLevelWith(const Point& point) const;
   /// Whether there are no better differences to go on with.
   bool isLastKind() const;
@@ -99,9 +106,11 @@ class Glm final : public SearchAlgorithm {
   GlmSettings settings_;
   SearchProblem problem_;
   FeasiblePoints feasible_;
+  GlmConstraints constraints_;
   SearchSummary summary_;
   std::deque<Point> starts_;  ///< not used yet, the best first
   std::optional<Point> best_;
+  std::string firstFailure_;                                      ///< of a run of the initial sample, one line
   double leastOfRuns_ = std::numeric_limits<double>::infinity();  ///< the least sum to which a run has come
   std::vector<double> units_;                                     ///< the finest of each residual
 
@@ -113,6 +122,8 @@ class Glm final : public SearchAlgorithm {
   bool isCentral_ = false;
   int updates_ = 0;  ///< after Broyden since the last Jacobian by differences
   int smallChanges_ = 0;
+  int stoppedChanges_ = 0;              ///< small ones of steps that constraints have stopped
+  std::vector<std::string> stoppedBy_;  ///< the constraints that have stopped steps of this iteration
   double lambda_ = 0.0;
   int runCount_ = 0;
   int iteration_ = 0;
@@ -127,6 +138,8 @@ class GlmMethod final : public SearchMethod {
   std::optional<SettingRefusal> refusalFor(const SearchSpace& space) const override;
   bool evaluatesSample(const InitialSampleSettings& /*sample*/) const override { return false; }
   std::int64_t sampleSize(const InitialSampleSettings& sample, int budget) const override;
+  std::vector<SearchDoubt> doubts() const override;
+  std::vector<SearchDoubt> doubtsIn(const SearchSpace& space) const override;
   /// Only sets that are drawn depend on the seed.
   std::string seedDoubt(const InitialSampleSettings& sample) const override;
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,

@@ -29,6 +29,9 @@ struct SearchSummary {
   double populationSpread = 0.0;   ///< search scale; populationSpread() of a search with a population
   double populationRange = 0.0;    ///< normalisedPopulationRange() of a search with a population
   std::string terminationMessage;  ///< empty while it runs
+  /// Why it has found nothing at all, which is an error, and more about it; empty if it has found something.
+  std::string failure;
+  std::string failureDetail;
   int finalRunOf = 0;              ///< the evaluation whose set the final model run repeats; 0: the best
   std::vector<std::string> notes;  ///< what the log should say of its course, one line each
   /// Search scale; of a search that draws nothing once it has its sample, the sets from which it went on: another that

@@ -42,10 +42,10 @@ struct SearchAdvice {
   std::int64_t advised = 0;  ///< the least value advised
 };
 
-/// A setting with which the search has nothing to search for.
+/// A setting that is valid and hardly meant.
 struct SearchDoubt {
   std::string_view keyword;
-  std::string_view text;
+  std::string text;
 };
 
 /// A search that was interrupted or ended, and is to be continued with a raised budget.
@@ -82,8 +82,10 @@ class SearchMethod {
   virtual void setVariableCount(std::size_t /*n*/) {}
   /// Settings that are small for n variable parameters.
   virtual std::vector<SearchAdvice> advice(std::size_t /*n*/) const { return {}; }
-  /// Settings that are valid and of which it is certain that they make the search pointless.
+  /// Settings that are valid and of which it is certain that they make the search pointless, or have no effect.
   virtual std::vector<SearchDoubt> doubts() const { return {}; }
+  /// Settings that are valid and hardly meant for these parameters.
+  virtual std::vector<SearchDoubt> doubtsIn(const SearchSpace& /*space*/) const { return {}; }
   /// Settings that do not fit the parameters.
   virtual std::optional<SettingRefusal> refusalFor(const SearchSpace& /*space*/) const { return std::nullopt; }
   /// The fixed text for a budget below 1, if the search has one of its own.

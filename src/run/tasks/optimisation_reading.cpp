@@ -299,7 +299,9 @@ void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection
     requireObjectives(section, kAlgorithmTypeKeyword, control, reading.objectives, method->facts().name.name, *pareto);
     keepsFrontSeries_ = pareto->series != FrontSeries::none && hasSeriesOfFront(reading.measures);
   }
-  control.require(method->refusalFor(BuildSearchSpace(reading.parameters)));
+  const SearchSpace space = BuildSearchSpace(reading.parameters);
+  control.require(method->refusalFor(space));
+  for (const SearchDoubt& doubt : method->doubtsIn(space)) control.warn(doubt.keyword, doubt.text);
 }
 
 void OptimisationTask::requireResiduals(const TaskReading& reading, const SetupSection& section) const {

@@ -10,6 +10,7 @@
 #include "algorithms/numbers/lapack_functions.h"
 #include "algorithms/pareto/front_scale.h"
 #include "algorithms/searches/residual_problem.h"
+#include "common/fatal_error.h"
 #include "common/text.h"
 #include "measures/statistics.h"
 #include "run/tasks/analysis_names.h"
@@ -314,6 +315,10 @@ void OptimisationTask::logEnd(const TaskContext& context, const SearchSummary& s
                               const std::vector<std::string>& course) const {
   for (const std::string& note : summary.notes) context.log.line(note);
   context.log.line(summary.terminationMessage);
+  if (!summary.failure.empty()) {
+    if (repetitions.count > 1) context.log.warning(summary.failure + ": " + summary.failureDetail);
+    return;
+  }
   for (const std::string& line : course) context.log.line(line);
   if (summary.replacedCount > 0) {
     context.log.line(fmt::format(
@@ -340,6 +345,7 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
     }
   }
   SearchSummary summary = searchAll(context);
+  if (!summary.failure.empty()) fatalError("Error: " + summary.failure, summary.failureDetail);
   hasSearched_ = true;
   TaskOutcome outcome{summary.terminationMessage};
   if (repeated_) {

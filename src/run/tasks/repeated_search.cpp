@@ -271,7 +271,7 @@ void RepeatedSearch::end(std::size_t index, const SearchSummary& summary) {
   own.loops = summary.loopCount;
   own.termination = summary.terminationMessage;
   own.starts = summary.starts;
-  if (summary.bestResult.ok() && !summary.best.empty()) {
+  if (summary.bestResult.ok() && !summary.best.empty() && summary.failure.empty()) {
     // The search knows which of several equal evaluations it took.
     own.bestEvaluation = summary.bestResult.number;
     own.aggregate = summary.bestResult.aggregate;
@@ -281,8 +281,9 @@ void RepeatedSearch::end(std::size_t index, const SearchSummary& summary) {
   const double before = best_.bestResult.aggregate;
   const double now = summary.bestResult.aggregate;
   // Side by side a later one may have ended before.
-  const bool isBetter =
-      summary.bestResult.ok() && (!best_.bestResult.ok() || now < before || (now == before && index < bestEnded_));
+  const bool isRescue = !best_.failure.empty() && summary.failure.empty();
+  const bool isBetter = isRescue || (summary.failure.empty() && summary.bestResult.ok() &&
+                                     (!best_.bestResult.ok() || now < before || (now == before && index < bestEnded_)));
   if (!isFirst && !isBetter) return;
   best_ = summary;
   bestEnded_ = index;

@@ -6,6 +6,8 @@
 #include <fmt/format.h>
 
 #include "algorithms/analyses/covariance.h"
+#include "algorithms/searches/glm_constraints.h"
+#include "algorithms/searches/initial_sample.h"
 #include "common/text.h"
 #include "measures/statistics.h"
 
@@ -63,6 +65,11 @@ void ResidualFitting::addCovariance(const TaskContext& context, TaskOutcome& out
       "Covariance at evaluation {}, the estimate, with the derivatives at evaluation {}; observations have the weights "
       "of the sum of squares",
       fit.evaluation, fit.jacobian->evaluation));
+  const SearchBounds bounds = searchBounds(context.space);
+  for (const std::string& constraint : GlmConstraints(context.feasibility, bounds).holdingTexts(fit.set)) {
+    outcome.report.push_back(fmt::format(
+        "Warning: The estimate lies at {}, of which covariance, correlation and limits take no account", constraint));
+  }
   const std::string prefix = context.filePrefix + "_Optimisation";
   const ParameterCovariance covariance = parameterCovariance(model);
   for (std::string& line : formatCovariance(covariance, context.space, fit.set, prefix)) {

@@ -31,6 +31,9 @@ struct GlmConditions {
   std::vector<TransformationType> transformation = {};
   std::function<bool(int number, const ParameterSet&)> fails = {};
   bool includesInitial = true;
+  /// Of constraints, each to be 0 or more; on the search scale.
+  std::function<std::vector<double>(const ParameterSet&)> margins = {};
+  bool areStrict = false;
 };
 
 struct GlmTrial {
@@ -40,11 +43,34 @@ struct GlmTrial {
   double sum() const { return summary.bestResult.aggregate; }
 };
 
+Feasibility feasibilityOf(const GlmConditions& c) {
+  const auto margins = [&c](std::span<const double> set) {
+    std::vector<ConstraintMargin> found;
+    for (const double value : c.margins(ParameterSet(set.begin(), set.end()))) {
+      found.push_back({value, std::abs(value), c.areStrict});
+    }
+    return found;
+  };
+  Feasibility feasibility([margins](std::span<const double> set) -> std::optional<std::string> {
+    for (const ConstraintMargin& margin : margins(set)) {
+      if (std::isnan(margin.value) || margin.isViolated()) return "violated";
+    }
+    return std::nullopt;
+  });
+  std::vector<std::string> texts;
+  for (std::size_t i = 1; i <= margins(std::vector<double>(4, 1.0)).size(); ++i) {
+    texts.push_back("constraint " + std::to_string(i));
+  }
+  feasibility.setMargins(margins, texts);
+  return feasibility;
+}
+
 GlmTrial glmSearch(const SearchBounds& bounds, const ResidualFunction& residualsOf, const GlmConditions& c) {
   int number = 0;
   FunctionEvaluator evaluator([&](const ParameterSet& set) {
     ++number;
     if (c.fails && c.fails(number, set)) return failedResult();
+    if (c.margins && !feasibilityOf(c).holds(set)) return failedResult();
     std::vector<double> residuals = residualsOf(set);
     EvaluationResult result = resultOf(std::inner_product(residuals.begin(), residuals.end(), residuals.begin(), 0.0));
     result.simulatedValues = std::move(residuals);
@@ -62,6 +88,7 @@ GlmTrial glmSearch(const SearchBounds& bounds, const ResidualFunction& residuals
   sample.includeInitialParameters = c.includesInitial;
   SearchProblem problem{bounds, {c.budget, 10, c.minChange}, sample, {}, evaluator, random};
   problem.residuals = &residuals;
+  if (c.margins) problem.feasibility = feasibilityOf(c);
   Glm glm(c.settings, std::move(problem));
   EXPECT_EQ(glm.advance(), kSearchNotInitialised);
   EXPECT_EQ(glm.initialise(), kSearchOk);
@@ -218,6 +245,213 @@ TEST(Glm, SeveralStartsFindTheBetterValley) {
   const GlmTrial trial = glmSearch(bounds, wells, c);
   EXPECT_NEAR(trial.summary.best[0], 2.0, 1e-6);
   EXPECT_THAT(notesOf(trial), HasSubstr("Run 2 of GLM starts from evaluation "));
+}
+
+/// Estimates of least squares under constraints in closed form.
+TEST(Glm, GoesAlongConstraintsToTheMinimumThatTheyLeave) {
+  using Set = ParameterSet;
+  // y = a + b x at x = 0 ... 9, of a = 1.6, b = 0.2 and errors whose sums, also with x, are 0.
+  const auto line = [](const Set& set) {
+    Set residuals;
+    for (int x = 0; x < 10; ++x) {
+      residuals.push_back(set[0] + set[1] * x - 1.6 - 0.2 * x -
+                          (x == 0 || x == 9   ? 0.4
+                           : x == 4 || x == 5 ? -0.4
+                                              : 0.0));
+    }
+    return residuals;
+  };
+  // With a = A: b = 0.2 + (1.6 - A) * 45 / 285. With a + b = 1.5: b = sum (y - 1.5) (x - 1) / sum (x - 1)^2.
+  const double alongSum = 51.5 / 205.0;
+  struct Case {
+    const char* name;
+    Set start;
+    std::function<Set(const Set&)> margins;
+    Set expected;
+    double tolerance;
+    const char* note;
+    bool isLogarithmic = false;
+    bool areStrict = false;
+  };
+  const Case cases[] = {
+      {"one bound from afar",
+       {1.0, -3.0},
+       [](const Set& s) { return Set{1.2 - s[0]}; },
+       {1.2, 0.2 + 0.4 * 45.0 / 285.0},
+       1e-6,
+       "The estimate lies at constraint 1"},
+      {"strict",
+       {1.0, 0.0},
+       [](const Set& s) { return Set{1.2 - s[0]}; },
+       {1.2, 0.2 + 0.4 * 45.0 / 285.0},
+       1e-6,
+       "The estimate lies at constraint 1",
+       false,
+       true},
+      {"a sum",
+       {0.0, 0.0},
+       [](const Set& s) { return Set{1.5 - s[0] - s[1]}; },
+       {1.5 - alongSum, alongSum},
+       1e-6,
+       "The estimate lies at constraint 1"},
+      {"two",
+       {0.0, 0.0},
+       [](const Set& s) {
+         return Set{1.2 - s[0], 0.1 - s[1]};
+       },
+       {1.2, 0.1},
+       1e-6,
+       "The estimate lies at constraint 2"},
+      {"one of two, the other holds no longer",
+       {-4.0, 4.0},
+       [](const Set& s) {
+         return Set{1.2 - s[0], 8.0 + s[0] - s[1]};
+       },
+       {1.2, 0.2 + 0.4 * 45.0 / 285.0},
+       1e-6,
+       "The estimate lies at constraint 1"},
+      {"logarithmic",
+       {0.0, 0.0},
+       [](const Set& s) { return Set{1.2 - std::exp(s[0])}; },
+       {std::log(1.2), 0.2 + 0.4 * 45.0 / 285.0},
+       1e-6,
+       "The estimate lies at constraint 1",
+       true},
+  };
+  for (const Case& each : cases) {
+    GlmConditions c;
+    c.margins = each.margins;
+    c.areStrict = each.areStrict;
+    c.minChange = 1e-9;
+    if (each.isLogarithmic) c.transformation = {TransformationType::logarithmic, TransformationType::none};
+    const auto residuals = [&](const Set& set) {
+      return line(each.isLogarithmic ? Set{std::exp(set[0]), set[1]} : set);
+    };
+    const SearchBounds bounds{{-5, -5}, {10, 5}, each.start};
+    const GlmTrial trial = glmSearch(bounds, residuals, c);
+    EXPECT_THAT(trial.summary.best, Pointwise(DoubleNear(each.tolerance), each.expected)) << each.name << "\n"
+                                                                                          << notesOf(trial);
+    EXPECT_THAT(notesOf(trial), HasSubstr(each.note)) << each.name;
+  }
+}
+
+/// The solution of the n linear equations with the rows a and, behind each, its right side; empty if there is none.
+std::vector<double> solved(std::vector<std::vector<double>> a) {
+  const std::size_t n = a.size();
+  for (std::size_t k = 0; k < n; ++k) {
+    std::size_t pivot = k;
+    for (std::size_t i = k + 1; i < n; ++i) pivot = std::abs(a[i][k]) > std::abs(a[pivot][k]) ? i : pivot;
+    std::swap(a[k], a[pivot]);
+    if (std::abs(a[k][k]) < 1e-12) return {};
+    for (std::size_t i = 0; i < n; ++i) {
+      const double factor = i == k ? 0.0 : a[i][k] / a[k][k];
+      for (std::size_t j = 0; j <= n; ++j) a[i][j] -= factor * a[k][j];
+    }
+  }
+  std::vector<double> x;
+  for (std::size_t k = 0; k < n; ++k) x.push_back(a[k][n] / a[k][k]);
+  return x;
+}
+
+/// Of all choices of constraints that hold as equations, the feasible minimum with the least sum: random linear models
+/// of three parameters with four constraints, from the origin, which meets them.
+TEST(Glm, FindsTheLeastSquaresOfRandomConstraints) {
+  UniformGenerator random(7);
+  const auto draw = [&](double low, double high) { return low + random.next() * (high - low); };
+  int activeCount = 0;
+  for (int problem = 0; problem < 60; ++problem) {
+    double columns[5][3];
+    double observed[5];
+    double normals[4][3];
+    double rooms[4];
+    for (int i = 0; i < 5; ++i) {
+      for (double& value : columns[i]) value = draw(-1.0, 1.0);
+      observed[i] = draw(-4.0, 4.0);
+    }
+    for (int c = 0; c < 4; ++c) {
+      for (double& value : normals[c]) value = draw(-1.0, 1.0);
+      rooms[c] = draw(0.1, 0.6);
+    }
+    const auto residuals = [&](const ParameterSet& x) {
+      std::vector<double> found;
+      for (int i = 0; i < 5; ++i) {
+        found.push_back(columns[i][0] * x[0] + columns[i][1] * x[1] + columns[i][2] * x[2] - observed[i]);
+      }
+      return found;
+    };
+    GlmConditions c;
+    c.minChange = 1e-9;
+    c.settings.perturbationFraction = 1e-5;
+    c.margins = [&](const ParameterSet& x) {
+      std::vector<double> found;
+      for (int k = 0; k < 4; ++k) {
+        found.push_back(rooms[k] + normals[k][0] * x[0] + normals[k][1] * x[1] + normals[k][2] * x[2]);
+      }
+      return found;
+    };
+    double least = 1e30;
+    ParameterSet expected;
+    for (unsigned chosen = 0; chosen < 16; ++chosen) {
+      std::vector<int> active;
+      for (int k = 0; k < 4; ++k) {
+        if ((chosen >> k & 1U) != 0U) active.push_back(k);
+      }
+      const std::size_t n = 3 + active.size();
+      std::vector<std::vector<double>> kkt(n, std::vector<double>(n + 1, 0.0));
+      for (std::size_t j = 0; j < 3; ++j) {
+        for (int i = 0; i < 5; ++i) {
+          for (std::size_t l = 0; l < 3; ++l) kkt[j][l] += columns[i][j] * columns[i][l];
+          kkt[j][n] += columns[i][j] * observed[i];
+        }
+        for (std::size_t a = 0; a < active.size(); ++a) kkt[j][3 + a] = kkt[3 + a][j] = normals[active[a]][j];
+      }
+      for (std::size_t a = 0; a < active.size(); ++a) kkt[3 + a][n] = -rooms[active[a]];
+      const std::vector<double> x = solved(kkt);
+      if (x.empty()) continue;
+      const ParameterSet set(x.begin(), x.begin() + 3);
+      if (std::ranges::min(c.margins(set)) < -1e-9) continue;
+      const std::vector<double> r = residuals(set);
+      const double sum = std::inner_product(r.begin(), r.end(), r.begin(), 0.0);
+      if (sum < least) expected = set;
+      least = std::min(least, sum);
+    }
+    if (!std::ranges::all_of(expected, [](double value) { return std::abs(value) < 50.0; })) continue;  // of the bounds
+    const GlmTrial trial = glmSearch({{-50, -50, -50}, {50, 50, 50}, {0, 0, 0}}, residuals, c);
+    EXPECT_NEAR(trial.sum(), least, 1e-6 * least) << problem << "\n" << notesOf(trial).substr(0, 2000);
+    if (std::ranges::min(c.margins(expected)) < 1e-6) ++activeCount;
+  }
+  EXPECT_GT(activeCount, 40);
+}
+
+/// The nearest point of a disc to one outside, and that of Rosenbrock's valley, whose end (1, 1) the disc cuts off.
+TEST(Glm, GoesAlongACurvedConstraint) {
+  GlmConditions c;
+  c.minChange = 1e-9;
+  c.settings.perturbationFraction = 1e-5;
+  c.margins = [](const ParameterSet& s) { return ParameterSet{1.0 - s[0] * s[0] - s[1] * s[1]}; };
+  const auto outside = [](const ParameterSet& s) { return std::vector{s[0] - 3.0, s[1] - 4.0}; };
+  const SearchBounds bounds{{-5, -5}, {5, 5}, {-0.9, 0.1}};
+  const GlmTrial nearest = glmSearch(bounds, outside, c);
+  EXPECT_THAT(nearest.summary.best, Pointwise(DoubleNear(1e-3), {0.6, 0.8})) << notesOf(nearest);
+
+  const auto valley = [](const ParameterSet& s) { return std::vector{10.0 * (s[1] - s[0] * s[0]), 1.0 - s[0]}; };
+  const GlmTrial bent = glmSearch(bounds, valley, c);
+  EXPECT_THAT(bent.summary.best, Pointwise(DoubleNear(1e-3), {0.78642, 0.61770})) << notesOf(bent);
+
+  // Crossed by the first step only: without it, the end of the valley is found.
+  c.margins = [](const ParameterSet& s) { return ParameterSet{s[1] + 0.5}; };
+  const GlmTrial whole = glmSearch({{-5, -5}, {5, 5}, {-1.2, 1.0}}, valley, c);
+  EXPECT_THAT(whole.summary.best, Pointwise(DoubleNear(1e-6), {1.0, 1.0})) << notesOf(whole);
+  EXPECT_THAT(notesOf(whole), Not(HasSubstr("constraint")));
+}
+
+/// A parameter that no observation sees makes way for one that all see.
+TEST(Glm, MovesWhatOnlyAConstraintDependsOn) {
+  GlmConditions c;
+  c.margins = [](const ParameterSet& s) { return ParameterSet{s[1] - s[0]}; };
+  const auto first = [](const ParameterSet& s) { return std::vector{s[0] - 3.0, 1.0}; };
+  const GlmTrial trial = glmSearch({{-5, -5}, {5, 5}, {0.0, 1.0}}, first, c);
+  EXPECT_NEAR(trial.summary.best.at(0), 3.0, 1e-6) << notesOf(trial);
 }
 
 /// Moré, Garbow and Hillstrom (1981), Testing Unconstrained Optimization Software, doi:10.1145/355934.355936, with
