@@ -191,11 +191,7 @@ void appendStepProblems(const EffectPlan& plan, const AnalysisNames& names, std:
                     "are left out: {}",
                     plan.infeasiblePoints, plan.violation));
   }
-  if (plan.isCorrelated) {
-    lines.emplace_back(
-        "Warning: The parameters are correlated: a step takes those along that follow in the list, as the correlations "
-        "want it, and an effect is that of all of them");
-  }
+  if (plan.isCorrelated) lines.push_back(std::string("   ") + kCorrelatedStepsText);
 }
 
 void appendLosses(const MorrisOutcome& outcome, const EffectPlan& plan, std::vector<std::string>& lines) {
@@ -224,10 +220,15 @@ std::string infeasiblePointsText(const EffectPlan& plan, std::span<const std::st
     if (plan.infeasible[j] > 0) lacking.add(fmt::format("{} ({} of {})", parameters[j], plan.infeasible[j], count));
   }
   if (plan.infeasiblePoints == 0 && lacking.isEmpty()) return {};
+  const bool hasPoints = plan.infeasiblePoints > 0;
   std::string text =
-      fmt::format("{} of {} points of the trajectories cannot be run and {} left out, with the effects of their steps",
-                  plan.infeasiblePoints, count * (parameters.size() + 1), plan.infeasiblePoints == 1 ? "is" : "are");
-  if (!plan.violation.empty()) text += fmt::format("; the first: {}", plan.violation);
+      hasPoints ? fmt::format(
+                      "{} of {} points of the trajectories cannot be run and {} left out, with the effects of their "
+                      "steps",
+                      plan.infeasiblePoints, count * (parameters.size() + 1), plan.infeasiblePoints == 1 ? "is" : "are")
+                : std::string("Of some parameters no step that can be run was found");
+  const std::string& violation = hasPoints ? plan.violation : plan.stepViolation;
+  if (!violation.empty()) text += fmt::format("; {}: {}", hasPoints ? "the first" : "one that was tried", violation);
   if (!lacking.isEmpty()) text += "\n   Parameters that lack effects, in how many trajectories: " + lacking.text();
   if (plan.design == EffectDesign::trajectories) {
     text += "\n   Design = 'radial' takes other points instead, as far as it finds some that can be run";
