@@ -72,7 +72,7 @@ void Texts::appendTable(const ScreenedOutput& output, std::span<const std::size_
     const ParameterEffects& p = output.effects.parameters[j];
     labels.push_back(fmt::format("{:>3}. {}", p.rank, names.parameters[j]));
     rows.push_back({p.muStar.value, p.muStar.lower, p.muStar.upper, p.mu.value, p.sigma.value, 100.0 * p.share.value,
-                    100.0 * p.share.upper, static_cast<double>(p.count), 100.0 * p.rankStability});
+                    100.0 * std::min(p.share.upper, 1.0), static_cast<double>(p.count), 100.0 * p.rankStability});
   }
   const std::string headings[] = {"mu*",         "lower 95 %", "upper 95 %",    "mu", "sigma", "% of largest",
                                   "at most (%)", "effects",    "rank holds (%)"};
@@ -130,7 +130,7 @@ void Texts::appendVerdicts(const ScreenedOutput& output, std::span<const std::si
   if (kept > 0) lines.push_back("   Must be kept: " + keepable);
   const auto [open, undecided] = list(ScreeningVerdict::undecided, false, [&](std::size_t j) {
     return fmt::format("{} ({} to {})", names.parameters[j], percent(ofParameter(j).share.lower),
-                       percent(ofParameter(j).share.upper));
+                       percent(std::min(ofParameter(j).share.upper, 1.0)));
   });
   if (open == 0) return;
   const double needed = output.effects.trajectoriesToDecide;
