@@ -60,7 +60,8 @@ std::optional<std::string> EqualMeasures::findIn(std::span<const ParameterSet> s
   }
   const auto isTrue = [](bool is) { return is; };
   const bool hasOneChanged = std::any_of(hasChanged_.begin(), hasChanged_.end(), isTrue);
-  isSettled_ = runCount_ > 0 && std::all_of(hasChanged_.begin(), hasChanged_.end(), isTrue);
+  isSettled_ = runCount_ > 0;
+  for (std::size_t k = 0; k < hasChanged_.size(); ++k) isSettled_ = isSettled_ && (hasChanged_[k] || isFixed(k));
   // A measure may well be the same in a few runs, such as a count; hardly all of them.
   const bool isEnough = (sets.size() > 1 && !hasOneChanged) || otherCount_ + 1 >= kEnoughRuns || isLast;
   if (isSettled_ || otherCount_ == 0 || !isEnough) return std::nullopt;
@@ -74,7 +75,7 @@ std::string EqualMeasures::warning(bool hasOneChanged) const {
   std::vector<std::string> measures;
   std::vector<std::string> files;
   for (std::size_t i = 0; i < measures_.size(); ++i) {
-    if (hasChanged_[i]) continue;
+    if (hasChanged_[i] || isFixed(i)) continue;
     measures.push_back(fmt::format("{} = {}", quotedForMessage(measures_[i]), formatReal(measureValues_[i])));
     files.push_back(resultFiles_[i]);
   }

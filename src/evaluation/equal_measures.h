@@ -21,8 +21,8 @@ class EqualMeasures final {
  public:
   /// Never finds anything.
   EqualMeasures() = default;
-  /// The fields of the parameters; the names of the measures, of the parameter files and of the files from which the
-  /// measures are read.
+  /// The fields of the parameters; the names of the measures, empty for those that no model can change, of the
+  /// parameter files and of the files from which the measures are read.
   EqualMeasures(SearchSpace space, ParameterFields fields, std::vector<std::string> measures,
                 std::vector<std::string> parameterFiles, std::vector<std::string> resultFiles);
 
@@ -34,6 +34,7 @@ class EqualMeasures final {
                                     bool isLast, const std::set<std::size_t>& repeats = {});
 
  private:
+  bool isFixed(std::size_t measure) const { return measures_[measure].empty(); }
   std::string warning(bool hasOneChanged) const;
 
   SearchSpace space_;

@@ -22,6 +22,7 @@
 #include "common/reading_watch.h"
 #include "common/run_files.h"
 #include "common/text.h"
+#include "measures/statistics.h"
 #include "parameters/read_template.h"
 #include "platform/processes/folder_room.h"
 #include "platform/processes/folder_tree.h"
@@ -209,7 +210,7 @@ EqualMeasures ModelRunner::equalMeasures() const {
   std::vector<std::string> names;
   std::vector<std::string> read;
   for (const MeasureSource& source : output_->sources()) {
-    names.push_back(source.name);
+    names.push_back(isWeightless(description_.measures[read.size()]) ? std::string() : source.name);
     read.push_back(source.fileName);
   }
   return {parameters_.searchSpace(),

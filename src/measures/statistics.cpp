@@ -278,6 +278,12 @@ bool takesWeights(const OutputMeasure& measure) {
   return statisticOf(measure.statisticType).takesWeights && transformationOf(measure) != ValueTransformation::rank;
 }
 
+bool isWeightless(const OutputMeasure& measure) {
+  const bool isOfFile = measure.interfaceType == InterfaceType::measureFile;
+  const bool usesWeights = isOfFile ? measure.observedValue.has_value() : !isCriterion(measure);
+  return usesWeights && measure.weight == 0.0 && measure.weightAbove == 0.0;
+}
+
 std::string describeStatistic(const OutputMeasure& measure) {
   std::string text(statisticOf(measure.statisticType).description);
   if (measure.transformation != ValueTransformation::none) {

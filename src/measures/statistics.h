@@ -50,6 +50,8 @@ double bestValue(const OutputMeasure& measure);
 ValueTransformation transformationOf(const OutputMeasure& measure);
 /// Whether its observations may have weights other than 0 and 1.
 bool takesWeights(const OutputMeasure& measure);
+/// Whether both of its weights are 0, so that it is the same whatever the model does; a criterion has no use for them.
+bool isWeightless(const OutputMeasure& measure);
 /// For people: the statistic and its transformation.
 std::string describeStatistic(const OutputMeasure& measure);
 /// To be put behind the value of a measure that is NaN: when its statistic is, ", as it is if ..."; empty if that is

@@ -103,6 +103,10 @@ void SetupCheck::runModel() {
   settings.warn = warnAbout;
   ModelRunner runner(std::move(model), parameters, aggregator, launcher, settings);
   for (const std::string& text : modelDoubts(config_, parameters, runner)) warnAbout(text);
+  if (config_.task) {
+    config_.task->requireObservations(parameters.searchSpace(), config_.measures, config_.objectives,
+                                      runner.output().observedSeries());
+  }
   const std::string folder = launcher.getProcessFolder(1);
   try {
     tryModel(parameters, runner, launcher);

@@ -329,6 +329,15 @@ TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfOnce) {
   }
 }
 
+TEST_F(LocalEvaluatorTest, AMeasureWithoutWeightsIsTheSameWhateverTheModelDoes) {
+  description_.measures.front().weight = description_.measures.front().weightAbove = 0.0;
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0, 3.0); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
+  evaluate(evaluator, {0, 1, 2}, DispatchMode::task);
+  evaluate(evaluator, {0}, DispatchMode::finalRun);
+  for (const std::string& event : observer_.events) EXPECT_THAT(event, Not(HasSubstr("same output measures")));
+}
+
 TEST_F(LocalEvaluatorTest, OneMeasureOfSeveralThatNeverChangesIsToldOf) {
   description_.measures.push_back(description_.measures.front());
   folder_.write("base/gauge.csv", series(0.0));

@@ -179,6 +179,22 @@ TEST(Glue, OfTheFilesOfAnEarlierRunNeedsNoModelRun) {
   EXPECT_EQ(folder.read("first.dat"), keptResults);
   EXPECT_EQ(folder.read("first_Simulated.bin"), values) << "they are only read";
 
+  EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("The run that made ")));
+  folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 1.0");
+  const std::string record = folder.read("first_Run.dat");
+  folder.write("first_Run.dat", record.substr(0, record.find("state\tfinished")) + "state\tcancelled\n");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  folder.useScript("");
+  const std::string told = runProgram({"--check", folder / "basin.kdx"}).output;
+  folder.useScript("exit 1");
+  for (const std::string& text : {folder.read("basin.log"), folder.read("basin.dat"), told}) {
+    EXPECT_THAT(text, AllOf(HasSubstr(" had other bounds: a from 0 to 10, in this setup from 1 to 10. 4 of its 40 "
+                                      "sets lie outside the bounds of this setup"),
+                            HasSubstr(" is not finished, it was cancelled: what is said is said of 40 evaluations")));
+  }
+  folder.write("first_Run.dat", record);
+  folder.editSetup("Lower_Bound = 1.0", "Lower_Bound = 0.0");
+
   folder.write("first_Simulated.bin", values.substr(0, values.size() / 2));
   ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("Warning: There are no bands: "));
@@ -251,7 +267,8 @@ TEST(Glue, OfASearchSaysThatItsSetsAreNoSampleOfTheParameters) {
   EXPECT_THAT(log, HasSubstr(" are those of a search, which went where the fit is better, and no sample"));
   EXPECT_FALSE(folder.exists("basin_SampleSensitivities.dat")) << "they say nothing of the distributions' outputs";
   EXPECT_THAT(log, HasSubstr("Warning: There are no bands: "));
-  EXPECT_THAT(log, HasSubstr("\n   Parameter, behavioural "));
+  EXPECT_THAT(log, AllOf(HasSubstr("\n   Parameter, behavioural "), HasSubstr("\n   Parameter, all sets "),
+                         Not(HasSubstr("drawn by this sample"))));
 }
 
 TEST(Glue, OfScenariosSaysThatTheirSetsAreNoSampleOfTheParameters) {

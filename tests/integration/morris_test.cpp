@@ -175,12 +175,27 @@ TEST_F(Morris, RefusesAndWarnsOfDesignsThatCannotServe) {
                            HasSubstr("Trajectories = 4: too few for limits"),
                            HasSubstr("Which parameters can be fixed is not said: that takes 5 effects of each")));
 
+  EXPECT_THAT(log(), Not(HasSubstr("The parameters are correlated")));
+
   // What is computed of the effects needs no further model run.
   folder_.editSetup("Levels = 6", "Levels = 6\nBootstrap_Samples = 200\nNegligible_Share = 0.2");
   folder_.editSetup("Restart = 0", "Restart = 1");
   const ProgramResult again = runProgram({setup_});
   EXPECT_EQ(again.exitCode, 0) << again.error;
   EXPECT_THAT(log(), HasSubstr("\n12 of them were taken from the earlier run\n"));
+}
+
+TEST_F(Morris, TellsBeforeTheFirstRunThatParametersAreCorrelated) {
+  writeSetup("Trajectories = 10");
+  folder_.editSetup("[MORRIS]",
+                    "[CORRELATIONS]\nTqSEKdxListItemCount = 1\n[PAIR_1]\nFirst_Parameter = 'a'\nSecond_Parameter = "
+                    "'b'\nCorrelation = 0.8\n[/PAIR_1]\n[/CORRELATIONS]\n[MORRIS]");
+  const std::string warning = "\nWarning: The parameters are correlated: a step takes those along";
+  EXPECT_THAT(runProgram({"--check", setup_}).output, HasSubstr(warning));
+  ASSERT_EQ(runProgram({setup_}).exitCode, 0);
+  const auto told = log().find(warning);
+  EXPECT_LT(told, log().find("No. 1 initiated"));
+  EXPECT_EQ(log().find(warning, told + 1), std::string::npos) << "once";
 }
 
 }  // namespace

@@ -216,6 +216,17 @@ TEST(SobolRun, AreRefusedWithTheReason) {
   }
 }
 
+TEST(SobolRun, SaysBeforeTheFirstRunThatASingleGroupHasKnownIndices) {
+  const ModelFolder folder;
+  const std::string setup = sobolSetup(folder, "Sample_Size = 32\nSeries_Indices = 'none'\nGroup = 'all: a, b'");
+  const std::string warning = "\nWarning: all is the only group, and has all parameters: its first-order and its total";
+  EXPECT_THAT(runProgram({"--check", setup}).output, HasSubstr(warning));
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const std::string log = folder.read("basin.log");
+  EXPECT_LT(log.find(warning), log.find("No. 1 initiated"));
+  EXPECT_THAT(log, ::testing::Not(HasSubstr("too small to tell which parameter matters more")));
+}
+
 TEST(SobolRun, SaysHowItsDistributionsAndConstraintsFitToTheBounds) {
   const ModelFolder folder;
   const std::string setup = sobolSetup(

@@ -92,6 +92,7 @@ class Planner {
   const Feasibility& feasibility_;
   UniformGenerator random_;
   EffectPlan plan_;
+  std::string lastViolation_;                                 ///< of the last set that cannot be run
   std::map<std::pair<std::size_t, double>, double> middles_;  ///< by integer parameter and value
 };
 
@@ -99,7 +100,8 @@ bool Planner::canRun(std::span<const double> set, bool isNoted) {
   if (!feasibility_.isTested()) return true;
   auto violation = feasibility_.violation(set);
   if (!violation) return true;
-  if (isNoted && plan_.infeasiblePoints++ == 0) plan_.violation = *std::move(violation);
+  if (isNoted && plan_.infeasiblePoints++ == 0) plan_.violation = *violation;
+  lastViolation_ = *std::move(violation);
   return false;
 }
 
@@ -186,6 +188,7 @@ void Planner::stepFromBase(EffectTrajectory& trajectory, const ParameterSet& bas
     return;
   }
   ++(wasChanged ? plan_.infeasible : plan_.unchanged)[j];
+  if (wasChanged && plan_.stepViolation.empty()) plan_.stepViolation = lastViolation_;
 }
 
 void Planner::planRadial() {

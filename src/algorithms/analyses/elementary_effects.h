@@ -46,6 +46,7 @@ struct EffectPlan {
   std::vector<std::size_t> infeasible;
   std::size_t infeasiblePoints = 0;  ///< points that are not run, as their sets cannot be
   std::string violation;             ///< of the first of these
+  std::string stepViolation;         ///< of a step tried for the first parameter for which none can be run
   bool isCorrelated = false;         ///< a step of a parameter moves others, those that its distribution is joined with
 };
 

@@ -251,6 +251,7 @@ GlueWeights glueWeights(const EvaluatedSample& sample, const GlueJudge& judge, c
     if (std::isnan(logarithms.back())) ++found.undefinedCount;
   }
   found.weights = scaledWeights(logarithms);
+  found.isInfinite = std::ranges::find(logarithms, kInfinity) != logarithms.end();
   found.unweightedCount = static_cast<std::size_t>(std::count(found.weights.begin(), found.weights.end(), 0.0));
   found.effective = effectiveCount(found.weights);
   return found;

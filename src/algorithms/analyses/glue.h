@@ -61,6 +61,7 @@ struct GlueWeights {
   std::size_t undefinedCount = 0;   ///< behavioural sets without a likelihood, whose weight is 0
   std::size_t unweightedCount = 0;  ///< behavioural sets with the weight 0, those included
   std::optional<std::size_t> best;  ///< index of the best set of all
+  bool isInfinite = false;          ///< a set without any error has an infinite likelihood, and all of the weight
   double effective = 0.0;           ///< effectiveCount() of the weights
 
   bool hasWeights() const { return effective > 0.0; }
@@ -103,10 +104,10 @@ std::string behaviouralText(const GlueJudge& judge, const GlueSettings& settings
 /// "likelihood: ..."
 std::string likelihoodText(const GlueSettings& settings);
 
-/// The result for people, for log, result file and report.
+/// The result for people, for log, result file and report. `areDrawn`: the sets are a sample of distributions.
 std::vector<std::string> formatGlue(const EvaluatedSample& sample, const GlueWeights& weights,
                                     const GlueSummary& summary, const GlueJudge& judge, const GlueSettings& settings,
-                                    const AnalysisNames& names, std::string_view correlationFile);
+                                    const AnalysisNames& names, std::string_view correlationFile, bool areDrawn);
 /// What to doubt, and what to do about it: no or few behavioural sets, weights that are those of a few sets, no choice
 /// at all.
 std::vector<std::string> glueWarnings(const EvaluatedSample& sample, const GlueWeights& weights, const GlueJudge& judge,

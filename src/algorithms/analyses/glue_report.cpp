@@ -39,20 +39,21 @@ void appendSummaries(std::vector<std::string>& lines, const std::string& title, 
 }
 
 /// Which parameters the observations tell something of, the most first.
-void appendDistances(std::vector<std::string>& lines, const GlueSummary& summary, std::span<const std::string> names) {
+void appendDistances(std::vector<std::string>& lines, const GlueSummary& summary, std::span<const std::string> names,
+                     std::string_view all) {
   std::vector<std::size_t> order(summary.parameters.size());
   for (std::size_t j = 0; j < order.size(); ++j) order[j] = j;
   const auto distance = [&](std::size_t j) { return summary.parameters[j].distance; };
   std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) { return distance(a) > distance(b); });
   lines.emplace_back();
   lines.push_back(
-      fmt::format("How far the behavioural values of a parameter are distributed otherwise than those drawn (largest "
+      fmt::format("How far the behavioural values of a parameter are distributed otherwise than those {} (largest "
                   "distance of the distribution functions; below {:.3f} it may be chance):",
-                  summary.distanceLimit));
+                  all, summary.distanceLimit));
   for (const std::size_t j : order) {
-    lines.push_back(
-        fmt::format("   {}: {:.3f}{}", names[j], distance(j),
-                    distance(j) > summary.distanceLimit ? "" : ", not told from those drawn by this sample"));
+    lines.push_back(fmt::format(
+        "   {}: {:.3f}{}", names[j], distance(j),
+        distance(j) > summary.distanceLimit ? "" : fmt::format(", not told from those {} by this sample", all)));
   }
 }
 
@@ -154,7 +155,7 @@ std::vector<DataTable> glueTables(const EvaluatedSample& sample, const GlueWeigh
 
 std::vector<std::string> formatGlue(const EvaluatedSample& sample, const GlueWeights& weights,
                                     const GlueSummary& summary, const GlueJudge& judge, const GlueSettings& settings,
-                                    const AnalysisNames& names, std::string_view correlationFile) {
+                                    const AnalysisNames& names, std::string_view correlationFile, bool areDrawn) {
   std::vector<std::string> lines;
   lines.push_back(fmt::format("GLUE: {} evaluations, {} failed and left out", sample.size(), weights.failedCount));
   lines.push_back("   " + behaviouralText(judge, settings));
@@ -173,12 +174,12 @@ std::vector<std::string> formatGlue(const EvaluatedSample& sample, const GlueWei
     drawn.push_back(parameter.drawn);
   }
   appendSummaries(lines, "Parameter, behavioural", names.parameters, behavioural);
-  appendSummaries(lines, "Parameter, as drawn", names.parameters, drawn);
+  appendSummaries(lines, areDrawn ? "Parameter, as drawn" : "Parameter, all sets", names.parameters, drawn);
   appendSummaries(lines, "Output measure, behavioural", names.measures, summary.measures);
   appendSummaries(lines, "Objective function, behavioural", names.objectives, summary.objectives);
   if (!names.validation.empty())
     appendSummaries(lines, "Validation, behavioural", names.validation, summary.validation);
-  appendDistances(lines, summary, names.parameters);
+  appendDistances(lines, summary, names.parameters, areDrawn ? "drawn" : "of all sets");
   const std::string title = "Correlation, behavioural";
   if (!summary.correlations.empty()) {
     append(lines, formatCorrelation(title, names.parameters, summary.correlations, correlationFile));
@@ -229,9 +230,10 @@ std::vector<std::string> glueWarnings(const EvaluatedSample& sample, const GlueW
   const std::size_t weighing = weights.behavioural.size() - weights.unweightedCount;
   if (weights.unweightedCount > weights.undefinedCount) {
     const std::size_t without = weights.unweightedCount - weights.undefinedCount;
-    warnings.push_back(fmt::format("{} of {} {} nothing, as {} likelihood is 0", without,
+    warnings.push_back(fmt::format("{} of {} {} nothing, as {} likelihood is {}", without,
                                    countText(weights.behavioural.size(), "behavioural set"),
-                                   without == 1 ? "weighs" : "weigh", without == 1 ? "its" : "their"));
+                                   without == 1 ? "weighs" : "weigh", without == 1 ? "its" : "their",
+                                   weights.isInfinite ? "finite, and that of sets without any error is not" : "0"));
   }
   const auto most = static_cast<double>(weighing);
   if (most < kFewSets) {

@@ -57,6 +57,11 @@ std::vector<std::string> formatMorris(const MorrisOutcome& outcome, const Effect
                                       const MorrisSettings& settings, const AnalysisNames& names,
                                       std::string_view file);
 
+/// Of a screening of correlated parameters.
+inline constexpr const char* kCorrelatedStepsText =
+    "The parameters are correlated: a step takes those along that follow in the list, as the correlations want it, and "
+    "an effect is that of all of them";
+
 /// Which points and effects the analysis has to do without, as sets cannot be run; empty: none.
 std::string infeasiblePointsText(const EffectPlan& plan, std::span<const std::string> parameters);
 

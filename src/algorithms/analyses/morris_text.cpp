@@ -72,7 +72,7 @@ void Texts::appendTable(const ScreenedOutput& output, std::span<const std::size_
     const ParameterEffects& p = output.effects.parameters[j];
     labels.push_back(fmt::format("{:>3}. {}", p.rank, names.parameters[j]));
     rows.push_back({p.muStar.value, p.muStar.lower, p.muStar.upper, p.mu.value, p.sigma.value, 100.0 * p.share.value,
-                    100.0 * p.share.upper, static_cast<double>(p.count), 100.0 * p.rankStability});
+                    100.0 * std::min(p.share.upper, 1.0), static_cast<double>(p.count), 100.0 * p.rankStability});
   }
   const std::string headings[] = {"mu*",         "lower 95 %", "upper 95 %",    "mu", "sigma", "% of largest",
                                   "at most (%)", "effects",    "rank holds (%)"};
@@ -130,7 +130,7 @@ void Texts::appendVerdicts(const ScreenedOutput& output, std::span<const std::si
   if (kept > 0) lines.push_back("   Must be kept: " + keepable);
   const auto [open, undecided] = list(ScreeningVerdict::undecided, false, [&](std::size_t j) {
     return fmt::format("{} ({} to {})", names.parameters[j], percent(ofParameter(j).share.lower),
-                       percent(ofParameter(j).share.upper));
+                       percent(std::min(ofParameter(j).share.upper, 1.0)));
   });
   if (open == 0) return;
   const double needed = output.effects.trajectoriesToDecide;
@@ -191,11 +191,7 @@ void appendStepProblems(const EffectPlan& plan, const AnalysisNames& names, std:
                     "are left out: {}",
                     plan.infeasiblePoints, plan.violation));
   }
-  if (plan.isCorrelated) {
-    lines.emplace_back(
-        "Warning: The parameters are correlated: a step takes those along that follow in the list, as the correlations "
-        "want it, and an effect is that of all of them");
-  }
+  if (plan.isCorrelated) lines.push_back(std::string("   ") + kCorrelatedStepsText);
 }
 
 void appendLosses(const MorrisOutcome& outcome, const EffectPlan& plan, std::vector<std::string>& lines) {
@@ -224,10 +220,15 @@ std::string infeasiblePointsText(const EffectPlan& plan, std::span<const std::st
     if (plan.infeasible[j] > 0) lacking.add(fmt::format("{} ({} of {})", parameters[j], plan.infeasible[j], count));
   }
   if (plan.infeasiblePoints == 0 && lacking.isEmpty()) return {};
+  const bool hasPoints = plan.infeasiblePoints > 0;
   std::string text =
-      fmt::format("{} of {} points of the trajectories cannot be run and {} left out, with the effects of their steps",
-                  plan.infeasiblePoints, count * (parameters.size() + 1), plan.infeasiblePoints == 1 ? "is" : "are");
-  if (!plan.violation.empty()) text += fmt::format("; the first: {}", plan.violation);
+      hasPoints ? fmt::format(
+                      "{} of {} points of the trajectories cannot be run and {} left out, with the effects of their "
+                      "steps",
+                      plan.infeasiblePoints, count * (parameters.size() + 1), plan.infeasiblePoints == 1 ? "is" : "are")
+                : std::string("Of some parameters no step that can be run was found");
+  const std::string& violation = hasPoints ? plan.violation : plan.stepViolation;
+  if (!violation.empty()) text += fmt::format("; {}: {}", hasPoints ? "the first" : "one that was tried", violation);
   if (!lacking.isEmpty()) text += "\n   Parameters that lack effects, in how many trajectories: " + lacking.text();
   if (plan.design == EffectDesign::trajectories) {
     text += "\n   Design = 'radial' takes other points instead, as far as it finds some that can be run";

@@ -11,6 +11,8 @@
 namespace mirevo {
 namespace {
 
+constexpr std::size_t kMostListed = 50;  // parameters in the log
+
 /// The form in which earlier versions had all of them.
 bool isNormalOnSearchScale(const Distribution& distribution) {
   return distribution.name() == "normal" && !distribution.isGivenOnModelScale();
@@ -125,7 +127,6 @@ std::string shareWarning(const Distribution& distribution, const SearchSpace& sp
 
 std::vector<std::string> distributionLines(const ParameterDistributions& distributions, const SearchSpace& space,
                                            std::string_view section) {
-  constexpr std::size_t kMostListed = 50;
   bool areNormal = true;
   for (std::size_t j = 0; j < distributions.size(); ++j) {
     areNormal = areNormal && isNormalOnSearchScale(distributions[j]);
@@ -159,12 +160,22 @@ std::vector<std::string> distributionLines(const ParameterDistributions& distrib
 
 std::vector<std::string> distributionWarnings(const ParameterDistributions& distributions, const SearchSpace& space) {
   std::vector<std::string> warnings;
+  std::size_t further = 0;
   for (std::size_t j = 0; j < distributions.size(); ++j) {
     const std::string bounds =
         fmt::format("bounds {:.6g} to {:.6g}", toModelScale(space, j, space.lower[j]), modelUpperBound(space, j));
     std::string warning = meanWarning(distributions[j], space, j, bounds);
     if (warning.empty()) warning = shareWarning(distributions[j], space, j, bounds);
-    if (!warning.empty()) warnings.push_back(std::move(warning));
+    if (warning.empty()) continue;
+    if (warnings.size() < kMostListed) {
+      warnings.push_back(std::move(warning));
+    } else {
+      ++further;
+    }
+  }
+  if (further > 0) {
+    warnings.push_back(
+        fmt::format("The distributions of {} fit their bounds as little", countText(further, "more parameter")));
   }
   return warnings;
 }

@@ -19,7 +19,7 @@ std::vector<std::string> distributionLines(const ParameterDistributions& distrib
                                            std::string_view section);
 
 /// One warning per distribution whose mean, that of a normal distribution, is outside the search bounds, or most of
-/// whose values are.
+/// whose values are. Of many the first are told, and how many there are more.
 std::vector<std::string> distributionWarnings(const ParameterDistributions& distributions, const SearchSpace& space);
 
 /// Counts the sets that leave the bounds, and with which parameters. What counts is the value that the model gets.

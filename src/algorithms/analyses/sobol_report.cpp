@@ -242,6 +242,15 @@ double widest(const SobolIndices& indices) {
 
 }  // namespace
 
+std::string singleFactorText(std::span<const SobolFactor> factors) {
+  if (factors.size() != 1) return {};
+  const SobolFactor& only = factors.front();
+  return fmt::format(
+      "{} is the only {}: its first-order and its total index are 1 by definition, as all variance comes from it. What "
+      "the run estimates besides is the error of the design; indices compare two or more parameters or groups",
+      only.name, only.parameters.size() > 1 ? "group, and has all parameters" : "parameter that varies");
+}
+
 SobolOutput sobolOutput(const SobolDesign& design, std::span<const double> values, const ReplicateBootstrap& bootstrap,
                         std::string kind, std::string name) {
   SobolOutput output{std::move(kind), std::move(name), sobolIndices(design, values, bootstrap, bootstrap.size()), {}};
@@ -315,6 +324,7 @@ std::vector<std::string> formatSobol(const SobolFindings& findings, std::string_
     lines.emplace_back(
         "   A failed run is left out of the estimates that need it, whose limits are the wider, and of no other");
   }
+  if (const std::string single = singleFactorText(findings.factors); !single.empty()) lines.push_back("   " + single);
   for (const SobolOutput& output : findings.outputs) {
     if (!isShown(findings, output)) continue;
     const SobolIndices& indices = output.indices;
@@ -331,6 +341,7 @@ std::vector<std::string> formatSobol(const SobolFindings& findings, std::string_
                                   dominanceText(findings, indices)));
       continue;
     }
+    if (findings.factors.size() == 1) continue;
     appendFixable(findings, output, lines);
     appendInteractions(findings, output, lines);
     appendNegative(findings, output, lines);
@@ -364,7 +375,7 @@ std::vector<std::string> sobolWarnings(const SobolFindings& findings) {
     most = width;
     name = output.name;
   }
-  if (most > kWideHalfWidth) {
+  if (most > kWideHalfWidth && findings.factors.size() > 1) {
     // The limits narrow with the root of the sample at least.
     const double factor = std::pow(most / kWideHalfWidth, 2);
     const std::string remedy =

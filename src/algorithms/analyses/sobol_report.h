@@ -38,6 +38,9 @@ struct SobolFindings {
   double negligibleIndex = 0.05;
 };
 
+/// Of a single factor, whose indices are known without a run; empty for more of them.
+std::string singleFactorText(std::span<const SobolFactor> factors);
+
 /// The indices of an output for the whole design and its stages. `values`: one per set, NaN for a failed run.
 SobolOutput sobolOutput(const SobolDesign& design, std::span<const double> values, const ReplicateBootstrap& bootstrap,
                         std::string kind, std::string name);

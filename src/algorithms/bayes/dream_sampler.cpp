@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
+#include <functional>
 #include <limits>
 #include <numeric>
 #include <utility>
@@ -39,6 +40,20 @@ bool isWithin(const DreamProblem& problem, std::span<const double> point) {
     if (!(point[j] >= problem.lower[j] && point[j] <= problem.upper[j])) return false;
   }
   return true;
+}
+
+/// Whether no chain stands still.
+bool isMoving(std::span<const std::vector<double>> columns) {
+  return std::ranges::all_of(columns, [](const std::vector<double>& column) {
+    return std::ranges::adjacent_find(column, std::not_equal_to()) != column.end();
+  });
+}
+
+bool isConstant(std::span<const std::vector<double>> columns) {
+  const double first = columns.front().front();
+  return std::ranges::all_of(columns, [first](const std::vector<double>& column) {
+    return std::ranges::all_of(column, [first](double value) { return value == first; });
+  });
 }
 
 }  // namespace
@@ -407,13 +422,22 @@ void DreamSampler::endGeneration() {
       if (isEnough && runs_ >= settings_.leastRuns) end_ = DreamEnd::converged;
     }
   }
-  // Of proposals that need no model run there could be any number.
+  // Of proposals that need no evaluation there could be any number.
   constexpr std::size_t kMostPerRun = 10;
   if (end_ == DreamEnd::none && runs_ >= settings_.mostRuns) end_ = DreamEnd::budget;
   if (end_ == DreamEnd::none &&
       generation * history_.chainCount() >= kMostPerRun * static_cast<std::size_t>(settings_.mostRuns)) {
     end_ = DreamEnd::generations;
   }
+}
+
+std::vector<std::vector<double>> DreamSampler::usedColumns(std::size_t dimension,
+                                                           std::vector<std::vector<double>> columns) const {
+  if (!problem_.usedValue) return columns;
+  for (std::vector<double>& column : columns) {
+    for (double& value : column) value = problem_.usedValue(dimension, value);
+  }
+  return columns;
 }
 
 std::optional<ConvergenceCheck> DreamSampler::checkNow() const {
@@ -426,8 +450,11 @@ std::optional<ConvergenceCheck> DreamSampler::checkNow() const {
   const std::size_t stride = (history_.generations() - *burnIn_ + values - 1) / values;
   for (std::size_t j = 0; j < dimension(); ++j) {
     const auto columns = history_.columns(j, *burnIn_, stride);
-    check.rHat.push_back(mirevo::largestRHat(columns));
-    check.effectiveSizes.push_back(leastEffectiveSampleSize(columns));
+    const auto used = usedColumns(j, columns);
+    const bool isKnown = isConstant(used) && isMoving(columns);
+    const std::size_t draws = (history_.generations() - *burnIn_) * history_.chainCount();
+    check.rHat.push_back(isKnown ? 1.0 : mirevo::largestRHat(used));
+    check.effectiveSizes.push_back(isKnown ? static_cast<double>(draws) : leastEffectiveSampleSize(used));
   }
   return check;
 }

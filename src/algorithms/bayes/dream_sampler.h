@@ -19,10 +19,10 @@ inline constexpr CodeName kBoundaryNames[] = {{std::nullopt, "fold"}, {std::null
 
 struct DreamSettings {
   std::int32_t chainCount = 4;        ///< N
-  std::int32_t mostRuns = 0;          ///< model runs, all chains together
+  std::int32_t mostRuns = 0;          ///< evaluations, all chains together, also of sets whose results are known
   double burnInShare = 0.2;           ///< of mostRuns, or of burnInOf
   std::int32_t burnInOf = 0;          ///< mostRuns of an earlier run that this one goes on with; 0: none
-  std::int32_t leastRuns = 0;         ///< model runs that an earlier run has made, which are used in any case
+  std::int32_t leastRuns = 0;         ///< evaluations that an earlier run has made, which are used in any case
   std::int32_t pairCount = 3;         ///< most pairs of archive members in a proposal (delta)
   std::int32_t crossoverCount = 3;    ///< crossover values 1/n, 2/n ... 1 (n_CR)
   double snookerShare = 0.1;          ///< share of snooker updates
@@ -59,6 +59,9 @@ struct DreamProblem {
   /// One result per proposal, all in one batch of model runs. May throw; the chains then end with their last complete
   /// generation.
   std::function<std::vector<ProposalResult>(std::span<const DreamProposal>)> evaluate;
+  /// What the likelihood has of a value of dimension j: of an integer parameter the step that the model gets. By these
+  /// it is judged whether the chains agree, as nothing depends on where in a step a chain is. Empty: the value itself.
+  std::function<double(std::size_t j, double value)> usedValue = {};
 };
 
 inline constexpr int kMostPriorDraws = 100'000;
@@ -102,9 +105,11 @@ class ChainHistory final {
 /// How well the chains agreed at some point of the run.
 struct ConvergenceCheck {
   std::size_t generations = 0;
-  int runs = 0;                        ///< model runs so far
-  std::vector<double> rHat;            ///< largestRHat(), one per dimension
-  std::vector<double> effectiveSizes;  ///< leastEffectiveSampleSize(), one per dimension
+  int runs = 0;  ///< evaluations so far
+  /// largestRHat() and leastEffectiveSampleSize(), one per dimension. Of one whose used value is the same in all states
+  /// of chains that move, R-hat is 1 and the size that of the sample: it is known.
+  std::vector<double> rHat;
+  std::vector<double> effectiveSizes;
 
   double largestRHat() const;         ///< infinite if one is not a number
   double leastEffectiveSize() const;  ///< 0 if one is not a number
@@ -193,6 +198,8 @@ class DreamSampler final {
   void adaptCrossover();
   void resetOutliers();
   void endGeneration();
+  /// The columns with DreamProblem::usedValue.
+  std::vector<std::vector<double>> usedColumns(std::size_t dimension, std::vector<std::vector<double>> columns) const;
 
   DreamSettings settings_;
   DreamProblem problem_;

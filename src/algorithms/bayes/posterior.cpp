@@ -13,6 +13,7 @@
 #include "algorithms/bayes/posterior_words.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "common/run_files.h"
+#include "common/short_list.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -63,10 +64,10 @@ std::string endText(const DreamSettings& settings, DreamEnd end) {
       return fmt::format("The chains ended as R-hat is at most {:g} and the effective sample size at least {:g}",
                          settings.rHatLimit, settings.effectiveSize);
     case DreamEnd::budget:
-      return fmt::format("The chains ended as the next generation would need more than {} model runs",
+      return fmt::format("The chains ended as the next generation would need more than {} evaluations",
                          settings.mostRuns);
     case DreamEnd::generations:
-      return "The chains ended as most proposals need no model run: they lie outside the bounds or the prior, violate "
+      return "The chains ended as most proposals need no evaluation: they lie outside the bounds or the prior, violate "
              "constraints, or change parameters of the error model alone";
     case DreamEnd::none:
       break;
@@ -197,6 +198,19 @@ void appendTold(const ShownDimensions& dimensions, const PosteriorSummary& summa
   if (hardlyNarrower > kMostLines) {
     lines.push_back(fmt::format("... and so of {}", countText(hardlyNarrower - kMostLines, "other parameter")));
   }
+}
+
+/// Those that have one value in all states of chains that move.
+void appendKnown(const ShownDimensions& dimensions, const PosteriorSummary& summary, std::vector<std::string>& lines) {
+  ShortList known(kMostListed);
+  for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
+    const PosteriorSummary::Dimension& own = summary.dimensions[j];
+    if (own.standardDeviation != 0.0 || own.rHat != 1.0) continue;
+    known.add(fmt::format("{} = {}", dimensions.names[j], formatReal(own.mean)));
+  }
+  if (known.isEmpty()) return;
+  lines.push_back(fmt::format("The same in all states, so that there is nothing on which the chains could disagree: {}",
+                              known.text()));
 }
 
 void appendCorrelations(const ShownDimensions& dimensions, const PosteriorSummary& summary,
@@ -375,7 +389,7 @@ std::string noLikelihoodText(const DreamSampler& sampler, const RunsWithoutLikel
     if (hasLikelihood(history.at(history.generations() - 1, c))) return {};
   }
   return fmt::format("No posterior: none of the {} has a likelihood: {}.{}",
-                     countText(static_cast<std::size_t>(sampler.runs()), "model run"), reasonsText(runs),
+                     countText(static_cast<std::size_t>(sampler.runs()), "evaluation"), reasonsText(runs),
                      remedyText(runs));
 }
 
@@ -385,7 +399,7 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
   const ChainHistory& history = sampler.history();
   std::vector<std::string> lines{fmt::format("DREAM(ZS): {} chains, {} generations, {}", history.chainCount(),
                                              history.generations(),
-                                             countText(static_cast<std::size_t>(sampler.runs()), "model run"))};
+                                             countText(static_cast<std::size_t>(sampler.runs()), "evaluation"))};
   lines.push_back(endText(settings, sampler.end()));
   if (const std::string text = noLikelihoodText(sampler, runs); !text.empty()) {
     lines.push_back("Warning: " + text);
@@ -393,7 +407,7 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
   }
   if (runs.count() > 0) {
     lines.push_back(fmt::format("{} without a likelihood, whose sets were rejected: {}",
-                                countText(static_cast<std::size_t>(runs.count()), "model run"), reasonsText(runs)));
+                                countText(static_cast<std::size_t>(runs.count()), "evaluation"), reasonsText(runs)));
   }
   if (summary == nullptr) {
     lines.emplace_back(sampler.burnIn() ? "Warning: No posterior: there are fewer than 4 generations behind burn-in"
@@ -401,7 +415,7 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
     return lines;
   }
   lines.push_back(
-      fmt::format("Burn-in: the first {} generations, {:g} of {} model runs, which are left out; the "
+      fmt::format("Burn-in: the first {} generations, {:g} of {} evaluations, which are left out; the "
                   "posterior is {} states behind it",
                   *sampler.burnIn(), settings.burnInShare,
                   settings.burnInOf > 0 ? settings.burnInOf : settings.mostRuns, summary->draws));
@@ -417,6 +431,7 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
   appendConvergence(settings, figures, lines);
   appendCounts(sampler, lines);
   appendQuantiles(dimensions, *summary, figures, files.posterior, lines);
+  appendKnown(dimensions, *summary, lines);
   const ConvergenceLimits limits{settings.rHatLimit, settings.effectiveSize};
   if (convergenceWords(figures, limits).state != Convergence::apart) appendTold(dimensions, *summary, figures, lines);
   appendCorrelations(dimensions, *summary, files.correlations, lines);

@@ -56,6 +56,7 @@ std::vector<const DimensionFigures*> worstFirst(std::span<const DimensionFigures
 std::string rHatText(double rHat, int digits) {
   constexpr double kLarge = 1000.0;
   if (std::isnan(rHat)) return "not known";
+  if (std::isinf(rHat)) return "not finite: chains stand still";
   return rHat > kLarge ? fmt::format("over {:g}", kLarge) : fmt::format("{:.{}g}", rHat, digits);
 }
 

@@ -45,7 +45,7 @@ struct ConvergenceWords {
   std::vector<std::string> findings;  ///< without "Warning: " and without a full stop at the end
 };
 
-/// "1.31", and where chains hardly move, whose value is infinite or as large as rounding makes it, "over 1000".
+/// "1.31"; where chains do not move, "not finite: chains stand still"; where they hardly do, "over 1000".
 std::string rHatText(double rHat, int digits = 3);
 
 /// A dimension counts as apart before its effective size is looked at; the worst stands first.

@@ -15,10 +15,12 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "measures/kept_steps.h"
+#include "run/results/earlier_sample_doubts.h"
 #include "run/results/restart_settings.h"
 #include "run/results/result_table.h"
 #include "run/results/row_check.h"
 #include "run/results/row_checksums.h"
+#include "run/results/run_record.h"
 #include "run/results/simulated_values_file.h"
 
 namespace mirevo {
@@ -252,6 +254,15 @@ EarlierSample readEarlierSample(const std::string& resultFile, const RunConfig& 
   found.notes.push_back(fmt::format("{} evaluations are taken from {}, {} of them failed", found.sample.size(),
                                     resultFile, std::ssize(found.sample.ok) - succeeded));
   compareSettings(resultFile, then, config, found);
+  const auto add = [&found](std::string warning) {
+    if (!warning.empty()) found.warnings.push_back(std::move(warning));
+  };
+  add(otherBoundsText(resultFile, then, config, found));
+  const std::string recordFile = pathBesideResults(resultFile, run_files::kPlain.record);
+  for (std::string& doubt :
+       unfinishedRunTexts(resultFile, readRunRecord(readFileIfThere(recordFile).value_or("")), found.sample)) {
+    add(std::move(doubt));
+  }
   openValues(resultFile, rows, config, observed, found);
   return found;
 }

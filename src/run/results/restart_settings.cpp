@@ -19,8 +19,10 @@
 #include "common/text.h"
 #include "common/version.h"
 #include "run/access/setup_schema.h"
+#include "run/tasks/correlation_reading.h"
 #include "run/tasks/dream_section.h"
 #include "run/tasks/repeated_search.h"
+#include "run/tasks/sensitivity_section.h"
 
 namespace mirevo {
 namespace {
@@ -145,17 +147,34 @@ std::string_view withoutQuotes(std::string_view value) {
   return value.size() >= 2 && value.front() == '\'' ? value.substr(1, value.size() - 2) : value;
 }
 
-/// The value by which two setups are compared: an objective function that DREAM has by its name stands as its number.
-std::string comparedValue(const RestartSettings& settings, const ResultSetting& setting) {
-  if (setting.keyword != kDreamObjectiveKeyword || setting.section != kDreamSectionName) return setting.value;
+/// The number from 1 of the item that a setting names, of those whose names are in sections that begin so; its value
+/// where that is not known.
+std::string numberOfItem(const RestartSettings& settings, const ResultSetting& setting, std::string_view sections,
+                         std::string_view nameKeyword) {
   if (!setting.value.starts_with('\'')) return setting.value;
   std::vector<std::string> names;
   for (const ResultSetting& other : settings.settings) {
-    if (other.keyword != "Name" || !other.section.starts_with("ObjectiveFunctions/OBJECTIVE_FUNCTIONS/")) continue;
+    if (other.keyword != nameKeyword || !other.section.starts_with(sections)) continue;
     names.emplace_back(withoutQuotes(other.value));
   }
   const std::vector<std::size_t> meant = itemsNamed(withoutQuotes(setting.value), names);
   return meant.size() == 1 ? std::to_string(meant.front() + 1) : setting.value;
+}
+
+/// The value by which two setups are compared, which is what it means: an item that is named otherwise is the same, and
+/// the sign of the seed of an analysis does not matter.
+std::string comparedValue(const RestartSettings& settings, const ResultSetting& setting) {
+  if (setting.keyword == kDreamObjectiveKeyword && setting.section == kDreamSectionName) {
+    return numberOfItem(settings, setting, "ObjectiveFunctions/OBJECTIVE_FUNCTIONS/", "Name");
+  }
+  if (setting.keyword == kFirstParameterKeyword || setting.keyword == kSecondParameterKeyword) {
+    return numberOfItem(settings, setting, "MODEL_PARAMETERS/", "Parameter_Name");
+  }
+  if (setting.keyword == kSeedKeyword &&
+      (setting.section == kUncertaintySection || setting.section == kSensitivitySection)) {
+    return std::string(setting.value.starts_with('-') ? std::string_view(setting.value).substr(1) : setting.value);
+  }
+  return setting.value;
 }
 
 /// A section for messages: "PARAMETER_3 (X3)" if the item has a name, else its whole path.

@@ -91,7 +91,7 @@ bool hasOneValue(const ModelParameter& parameter) {
 void warnOfStatistic(const OutputMeasure& measure, const SetupSection& section) {
   const Statistic& statistic = statisticOf(measure.statisticType);
   if (statistic.key.code) {
-    if (measure.weight == 0.0 && measure.weightAbove == 0.0) {
+    if (isWeightless(measure)) {
       section.warn("Weight", "both weights are 0, the measure does not depend on the model");
     }
   } else {
@@ -126,7 +126,7 @@ void warnOfModelsNumber(const OutputMeasure& measure, const SetupSection& sectio
   const std::string_view reason = measure.observedValue
                                       ? "has no effect with Interface_Type = 1: the model's number is compared as it is"
                                       : "has no effect with Interface_Type = 1: the model's number is taken as it is";
-  if (measure.observedValue && measure.weight == 0.0 && measure.weightAbove == 0.0) {
+  if (isWeightless(measure)) {
     section.warn("Weight", "both weights are 0, the measure does not depend on the model");
   }
   if (!statisticOf(measure.statisticType).key.code) {

@@ -20,8 +20,6 @@ namespace {
 using Matrix = std::vector<std::vector<double>>;
 
 constexpr std::string_view kTypeKeyword = "Correlation_Type";
-constexpr std::string_view kFirstKeyword = "First_Parameter";
-constexpr std::string_view kSecondKeyword = "Second_Parameter";
 constexpr std::string_view kValueKeyword = "Correlation";
 constexpr const char* kFileRefusal = "Error: Correlation file invalid";
 /// Without codes: names only.
@@ -44,38 +42,39 @@ struct Sections {
 };
 
 Sections sectionsOf(std::string_view path, std::string_view pairPath) {
-  return {{{path,
-            "if it is there",
-            "Correlations of the parameters whose distributions are given; parameters that are not named here are "
-            "independent.",
-            {itemCount(),
-             choice<CorrelationSettings>(
-                 [](CorrelationSettings& s, const SetupValue& value) {
-                   s.areRanks = equalIgnoringCase(std::get<std::string>(value), kTypeNames[1].name);
-                 },
-                 {.name = kTypeKeyword,
-                  .defaultValue = "'normal scores'",
-                  .codes = kTypeNames,
-                  .meaning = "What the correlations are of: the normal scores of the parameters, which for normal "
-                             "distributions on the search scale are the parameters themselves, or their ranks "
-                             "(Spearman)."}),
-             setting<&CorrelationSettings::file>(
-                 {.name = kCorrelationFileKeyword,
-                  .type = KeywordType::fileName,
-                  .defaultValue = kNoDefault,
-                  .meaning = "Table of correlations, such as the `<setup>_Correlation.dat` of a local sensitivity "
-                             "analysis with a covariance. The pairs replace those of the file."})}}},
-          {{pairPath,
-            "for each pair",
-            "The correlation of two variable parameters.",
-            {setting<&CorrelatedPair::first>(
-                 {.name = kFirstKeyword, .type = KeywordType::name, .meaning = "Name of a variable parameter."}),
-             setting<&CorrelatedPair::second>(
-                 {.name = kSecondKeyword, .type = KeywordType::name, .meaning = "Name of another."}),
-             setting<&CorrelatedPair::correlation>({.name = kValueKeyword,
-                                                    .range = between(-1, 1),
-                                                    .refusal = "Error: Correlation of parameters invalid",
-                                                    .meaning = "Their correlation."})}}}};
+  return {
+      {{path,
+        "if it is there",
+        "Correlations of the parameters whose distributions are given; parameters that are not named here are "
+        "independent.",
+        {itemCount(),
+         choice<CorrelationSettings>(
+             [](CorrelationSettings& s, const SetupValue& value) {
+               s.areRanks = equalIgnoringCase(std::get<std::string>(value), kTypeNames[1].name);
+             },
+             {.name = kTypeKeyword,
+              .defaultValue = "'normal scores'",
+              .codes = kTypeNames,
+              .meaning = "What the correlations are of: the normal scores of the parameters, which for normal "
+                         "distributions on the search scale are the parameters themselves, or their ranks "
+                         "(Spearman)."}),
+         setting<&CorrelationSettings::file>(
+             {.name = kCorrelationFileKeyword,
+              .type = KeywordType::fileName,
+              .defaultValue = kNoDefault,
+              .meaning = "Table of correlations, such as the `<setup>_Correlation.dat` of a local sensitivity "
+                         "analysis with a covariance. The pairs replace those of the file."})}}},
+      {{pairPath,
+        "for each pair",
+        "The correlation of two variable parameters.",
+        {setting<&CorrelatedPair::first>(
+             {.name = kFirstParameterKeyword, .type = KeywordType::name, .meaning = "Name of a variable parameter."}),
+         setting<&CorrelatedPair::second>(
+             {.name = kSecondParameterKeyword, .type = KeywordType::name, .meaning = "Name of another."}),
+         setting<&CorrelatedPair::correlation>({.name = kValueKeyword,
+                                                .range = between(-1, 1),
+                                                .refusal = "Error: Correlation of parameters invalid",
+                                                .meaning = "Their correlation."})}}}};
 }
 
 const Sections& sections(std::string_view task) {
@@ -171,10 +170,10 @@ std::optional<GaussianCopula> readCorrelations(const SetupSection& section, cons
   std::vector<CorrelatedPair> pairs;
   std::map<std::pair<std::size_t, std::size_t>, std::pair<double, std::string>> earlierPairs;  // with its place
   given->readItems("PAIR_", rows.pair, pairs, [&](const SetupSection& item, const CorrelatedPair& pair) {
-    const std::size_t i = parameterNamed(pair.first, kFirstKeyword, item, space);
-    const std::size_t j = parameterNamed(pair.second, kSecondKeyword, item, space);
+    const std::size_t i = parameterNamed(pair.first, kFirstParameterKeyword, item, space);
+    const std::size_t j = parameterNamed(pair.second, kSecondParameterKeyword, item, space);
     if (i == j) {
-      item.refuse("Error: Correlation of parameters invalid", kSecondKeyword,
+      item.refuse("Error: Correlation of parameters invalid", kSecondParameterKeyword,
                   fmt::format("expected another parameter than {}", space.names[i]));
     }
     const auto [earlier, isNew] =

@@ -10,6 +10,8 @@
 
 namespace mirevo {
 
+inline constexpr std::string_view kFirstParameterKeyword = "First_Parameter";
+inline constexpr std::string_view kSecondParameterKeyword = "Second_Parameter";
 inline constexpr std::string_view kCorrelationFileKeyword = "Correlation_File";
 
 /// The sections of the correlations inside that of a task, "UNCERTAINTY_ESTIMATION/CORRELATIONS".

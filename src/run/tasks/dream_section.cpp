@@ -149,7 +149,7 @@ std::vector<KeywordRow> dreamRows() {
            .range = kPositive,
            .refusal = kDreamRefusal,
            .meaning = "... and the effective sample size of each at least this. It can be no more than "
-                      "the model runs behind burn-in.",
+                      "the evaluations behind burn-in.",
            .bearsOnResults = kNotOfResults}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.pairCount; },
                             {.name = "Max_Pairs",
@@ -319,7 +319,7 @@ void checkDream(const SetupSection& dream, const DreamSection& settings, std::si
 const SettingSection<DreamSection>& dreamSection() {
   static const SettingSection<DreamSection> section{
       {kDreamSectionName, "when `Uncertainty_Type` is 'DREAM'",
-       "The posterior distribution by Markov chains, DREAM(ZS). `Sample_Size` is the most model runs that it makes, "
+       "The posterior distribution by Markov chains, DREAM(ZS). `Sample_Size` is the most evaluations that it makes, "
        "and at least ten for each chain.",
        dreamRows()}};
   return section;

@@ -30,12 +30,13 @@ std::vector<double> numbersOf(ErrorTerm term, const ErrorModelSettings& common, 
 
 }  // namespace
 
-DreamTarget::DreamTarget(const DreamSection& settings, const ParameterDistributions& prior, const TaskContext& context)
-    : prior_(prior), lower_(context.space.lower), upper_(context.space.upper) {
+DreamTarget::DreamTarget(const DreamSection& settings, const ParameterDistributions& prior,
+                         const LikelihoodBasis& basis)
+    : prior_(prior), lower_(basis.space.lower), upper_(basis.space.upper) {
   if (settings.errors.form == LikelihoodForm::objective) {
     objective_ = static_cast<std::size_t>(settings.objective);
   } else {
-    addSeries(settings, context);
+    addSeries(settings, basis);
   }
   for (const Dimension& dimension : errors_) {
     lower_.push_back(dimension.lower);
@@ -43,13 +44,13 @@ DreamTarget::DreamTarget(const DreamSection& settings, const ParameterDistributi
   }
 }
 
-void DreamTarget::addSeries(const DreamSection& settings, const TaskContext& context) {
+void DreamTarget::addSeries(const DreamSection& settings, const LikelihoodBasis& basis) {
   std::size_t first = 0;
-  const std::vector<std::size_t> compared = measuresOfLikelihood(context.measures, context.objectives);
-  for (std::size_t k = 0; k < context.observedSeries.size(); ++k) {
-    const ObservedSeries& observed = context.observedSeries[k];
+  const std::vector<std::size_t> compared = measuresOfLikelihood(basis.measures, basis.objectives);
+  for (std::size_t k = 0; k < basis.observed.size(); ++k) {
+    const ObservedSeries& observed = basis.observed[k];
     const std::size_t begin = std::exchange(first, first + 2 * observed.values.size());  // values, then their units
-    const OutputMeasure& measure = context.measures[observed.measure];
+    const OutputMeasure& measure = basis.measures[observed.measure];
     if (std::ranges::find(compared, observed.measure) == compared.end()) continue;
     const auto found = settings.own.find(observed.measure + 1);
     const ErrorModelSettings* const own = found == settings.own.end() ? nullptr : &found->second;
@@ -246,6 +247,10 @@ DreamProblem DreamTarget::problem(const TaskContext& context) {
   problem.logPrior = [this, &context](std::span<const double> point) { return logPrior(context.feasibility, point); };
   problem.evaluate = [this, &context](std::span<const DreamProposal> proposals) {
     return evaluate(context, proposals);
+  };
+  problem.usedValue = [&space = context.space](std::size_t j, double value) {
+    const bool isInteger = j < space.size() && space.transformation[j] == TransformationType::integer;
+    return isInteger ? toModelScale(space, j, value) : value;
   };
   return problem;
 }

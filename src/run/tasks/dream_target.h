@@ -16,6 +16,14 @@
 
 namespace mirevo {
 
+/// What the dimensions of a posterior are derived from.
+struct LikelihoodBasis {
+  const SearchSpace& space;
+  std::span<const OutputMeasure> measures;
+  std::span<const ObjectiveFunction> objectives;
+  std::span<const ObservedSeries> observed;  ///< TaskContext::observedSeries
+};
+
 /// The posterior that DREAM samples: parameters of the model, then those of the errors of each series.
 class DreamTarget final {
  public:
@@ -31,7 +39,7 @@ class DreamTarget final {
   };
 
   /// Throws FatalError where the setup's error models do not fit the observations.
-  DreamTarget(const DreamSection& settings, const ParameterDistributions& prior, const TaskContext& context);
+  DreamTarget(const DreamSection& settings, const ParameterDistributions& prior, const LikelihoodBasis& basis);
 
   /// For the sampler; `context` and this must outlive it.
   DreamProblem problem(const TaskContext& context);
@@ -59,7 +67,7 @@ class DreamTarget final {
     bool isLogarithmic = false;  ///< sampled as its logarithm
   };
 
-  void addSeries(const DreamSection& settings, const TaskContext& context);
+  void addSeries(const DreamSection& settings, const LikelihoodBasis& basis);
   void addTerms(const DreamSection& settings, const ErrorModelSettings* own, LikelihoodForm form, Series& series);
   std::vector<double> pointAt(std::span<const double> unit) const;
   double logPrior(const Feasibility& feasibility, std::span<const double> point) const;

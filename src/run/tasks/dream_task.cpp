@@ -141,7 +141,7 @@ void DreamTask::checkSize(const TaskReading& reading, const SetupSection& sectio
   constexpr std::int32_t kLeastGenerations = 10;
   if (settings.sampleSize < kLeastGenerations * dream.sampler.chainCount) {
     section.refuse(kSampleSizeRefusal, kSampleSizeKeyword,
-                   fmt::format("expected {} model runs for each of the {} chains or more, found {}", kLeastGenerations,
+                   fmt::format("expected {} evaluations for each of the {} chains or more, found {}", kLeastGenerations,
                                dream.sampler.chainCount, settings.sampleSize));
   }
   if (const auto tooMany = tooManySets(settings.sampleSize, reading.variableCount + kErrorTermCount)) {
@@ -164,7 +164,7 @@ std::vector<std::string> DreamTask::summaryLines(const SearchSpace& space) const
   std::vector<std::string> lines = distributionLines(prior_, space, kUncertaintySection);
   lines.insert(lines.end(),
                {fmt::format("Likelihood: {}", kLikelihoodNames[static_cast<std::size_t>(*dream.errors.form)].name),
-                fmt::format("{} chains, at most {} model runs; the first {:g} of them are burn-in", own.chainCount,
+                fmt::format("{} chains, at most {} evaluations; the first {:g} of them are burn-in", own.chainCount,
                             own.mostRuns, own.burnInRuns()),
                 fmt::format("They may end before with R-hat at most {:g} and effective sample sizes of at least {:g}",
                             own.rHatLimit, own.effectiveSize)});
@@ -180,7 +180,7 @@ std::vector<std::string> DreamTask::warnings(const SearchSpace& space) const {
 }
 
 /// The chains begin as they did, whatever Sample_Size, R_Hat_Limit and Effective_Size are now: burn-in keeps its
-/// length, and model runs that were made are used.
+/// length, and evaluations that were made are used.
 std::optional<RaisedBudget> DreamTask::raisedBudget(const SearchHistory& history) const {
   RaisedBudget raised;
   const int before = history.searches.empty() ? 0 : history.searches.back().lastEvaluation;
@@ -226,6 +226,12 @@ void DreamTask::requireSets(const SearchSpace& space, const Feasibility& feasibi
                                     : "Error: No parameter set found in the prior that can be run",
              fmt::format("{}: none of {} sets drawn from the prior of DREAM can be run: {}", dream.place,
                          kMostPriorDraws, reason));
+}
+
+void DreamTask::requireObservations(const SearchSpace& space, std::span<const OutputMeasure> measures,
+                                    std::span<const ObjectiveFunction> objectives,
+                                    std::span<const ObservedSeries> observed) const {
+  const DreamTarget target(dream, prior_, {space, measures, objectives, observed});
 }
 
 std::optional<ParameterSet> DreamTask::trialSet(const SearchSpace& space, const Feasibility& feasibility) const {
@@ -286,7 +292,8 @@ void DreamTask::advance() {
 }
 
 TaskOutcome DreamTask::run(const TaskContext& context) {
-  target_ = std::make_unique<DreamTarget>(dream, prior_, context);
+  target_ = std::make_unique<DreamTarget>(
+      dream, prior_, LikelihoodBasis{context.space, context.measures, context.objectives, context.observedSeries});
   for (const std::string& line : target_->descriptionLines()) context.log.line(line);
   logBandTimes(context, settings);
   logRoomOfSimulatedValues(context, facts().resultFiles.simulatedValues, static_cast<std::size_t>(settings.sampleSize),
@@ -299,14 +306,14 @@ TaskOutcome DreamTask::run(const TaskContext& context) {
     if (wasBurningIn && sampler_->burnIn()) {
       wasBurningIn = false;
       context.log.line(
-          fmt::format("Burn-in ends after {} generations, {} model runs", *sampler_->burnIn(), sampler_->runs()));
+          fmt::format("Burn-in ends after {} generations, {} evaluations", *sampler_->burnIn(), sampler_->runs()));
     }
     if (sampler_->checks().size() == checks) continue;
     checks = sampler_->checks().size();
     if (!noLikelihood().empty()) continue;
     const ConvergenceCheck& check = sampler_->checks().back();
     constexpr int kDigits = 4;
-    context.log.line(fmt::format("Generation {}, {} model runs: largest R-hat {}, least effective sample size {:.0f}",
+    context.log.line(fmt::format("Generation {}, {} evaluations: largest R-hat {}, least effective sample size {:.0f}",
                                  check.generations, check.runs, rHatText(check.largestRHat(), kDigits),
                                  check.leastEffectiveSize()));
   }

@@ -30,6 +30,9 @@ class DreamTask final : public Task {
   std::optional<KeptSteps> keptSteps() const override;
   bool usesExactMeasures() const override { return true; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
+  void requireObservations(const SearchSpace& space, std::span<const OutputMeasure> measures,
+                           std::span<const ObjectiveFunction> objectives,
+                           std::span<const ObservedSeries> observed) const override;
   std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   /// Of the generations that are complete.

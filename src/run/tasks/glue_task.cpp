@@ -240,7 +240,8 @@ GlueTask::Found GlueTask::find(const TaskContext& context, const EarlierSample& 
   Found found{{std::string(kEndOfTask)}, glueWarnings(sample, weights, judge_, glue), weights.hasWeights()};
   TaskOutcome& outcome = found.outcome;
   outcome.report = formatGlue(sample, weights, summary, judge_, glue, names,
-                              fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
+                              fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)),
+                              evaluated.isOfDistributions);
   outcome.tables = glueTables(sample, weights, summary, judge_, glue, names);
   if (evaluated.isOfDistributions) addSensitivity(context, evaluated, outcome);
   if (!evaluated.simulatedColumns) return found;
@@ -266,7 +267,9 @@ TaskOutcome GlueTask::run(const TaskContext& context) {
   for (const std::string& text : evaluated.warnings) context.log.warning(text);
   Found found = find(context, evaluated);
   logReport(context, found.outcome.report);
-  addNotes(found.warnings, found.outcome.report);
+  std::vector<std::string> notes = evaluated.warnings;
+  notes.insert(notes.end(), found.warnings.begin(), found.warnings.end());
+  addNotes(notes, found.outcome.report);
   for (const std::string& text : found.warnings) {
     if (!found.hasWeights && context.warnUser) {
       context.warnUser(text);

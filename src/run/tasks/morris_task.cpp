@@ -81,7 +81,11 @@ std::vector<std::string> MorrisTask::summaryLines(const SearchSpace& space) cons
 }
 
 std::vector<std::string> MorrisTask::warnings(const SearchSpace& space) const {
-  std::vector<std::string> texts = distributionWarnings(distributionsIn(space), space);
+  const ParameterDistributions drawnFrom = distributionsIn(space);
+  std::vector<std::string> texts = distributionWarnings(drawnFrom, space);
+  if (drawnFrom.copula() && !drawnFrom.copula()->correlatedOnes().empty()) {
+    texts.emplace_back(kCorrelatedStepsText);
+  }
   if (settings.trajectories >= static_cast<std::int32_t>(kFewestEffectsForSigma)) return texts;
   texts.push_back(fmt::format("{} = {}: {}", kTrajectoriesKeyword, settings.trajectories,
                               settings.trajectories < static_cast<std::int32_t>(kFewestEffects)
@@ -96,8 +100,8 @@ void MorrisTask::requireSets(const SearchSpace& space, const Feasibility& feasib
   for (const EffectTrajectory& trajectory : plan.trajectories) {
     if (!pairsOf(plan, trajectory).empty()) return;
   }
-  fatalError(feasibility.noSetMessage(),
-             fmt::format("No elementary effect has two sets that can be run: {}", plan.violation));
+  fatalError(feasibility.noSetMessage(), fmt::format("No elementary effect has two sets that can be run: {}",
+                                                     plan.violation.empty() ? plan.stepViolation : plan.violation));
 }
 
 std::vector<SetDoubt> MorrisTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {

@@ -196,6 +196,7 @@ std::vector<std::string> SobolTask::summaryLines(const SearchSpace& space) const
 
 std::vector<std::string> SobolTask::warnings(const SearchSpace& space) const {
   std::vector<std::string> texts = distributionWarnings(distributions_, space);
+  if (std::string single = singleFactorText(factors_); !single.empty()) texts.push_back(std::move(single));
   const std::size_t rows = design_.rows;
   if (std::has_single_bit(rows)) return texts;
   texts.push_back(fmt::format("{} = {} is no power of two: the points of the design are less even than those of {}",

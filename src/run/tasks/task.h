@@ -203,6 +203,12 @@ class Task {
   /// nothing from the random numbers of run().
   virtual void requireSets(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {}
 
+  /// Throws FatalError if run() would before its first model run, as its settings do not fit the observations, which
+  /// are those of TaskContext::observedSeries.
+  virtual void requireObservations(const SearchSpace& /*space*/, std::span<const OutputMeasure> /*measures*/,
+                                   std::span<const ObjectiveFunction> /*objectives*/,
+                                   std::span<const ObservedSeries> /*observed*/) const {}
+
   /// What run() will warn of before its first model run: sets that will be evaluated although they cannot be run.
   virtual std::vector<SetDoubt> setDoubts(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {
     return {};

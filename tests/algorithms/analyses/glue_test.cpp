@@ -159,6 +159,12 @@ TEST(GlueWeights, SayWhyThereAreNone) {
               ElementsAre(StartsWith("1 of 3 behavioural sets weighs nothing, as its"),
                           StartsWith("Only 2 behavioural sets have a weight: "),
                           StartsWith("The weights of 2 behavioural sets tell as much as 1.0 sets")));
+  const OutputMeasure error = measureOf("root mean square");
+  const GlueSettings all{.share = 1.0};
+  const EvaluatedSample perfect = sampleOf({0.0, 1.0, 0.0});
+  EXPECT_THAT(glueWarnings(perfect, glueWeights(perfect, judgeOf(error), all), judgeOf(error), all),
+              Contains("1 of 3 behavioural sets weighs nothing, as its likelihood is finite, and that of sets without "
+                       "any error is not"));
   std::vector<double> many(300, 0.5);
   many[7] = 0.9999;
   EXPECT_THAT(warningsOf(sampleOf(many), {.share = 1.0, .shapeFactor = 2.0}),

@@ -312,6 +312,19 @@ TEST(ElementaryEffects, SetsThatCannotBeRunAreNotHandedOver) {
   }
 }
 
+TEST(ElementaryEffects, TheConstraintThatLeavesNoStepIsNamed) {
+  const SearchSpace space = spaceOf(2);
+  const ParameterDistributions distributions = ParameterDistributions::uniform(space);
+  // No step of at least a tenth of its range leads from one value of b to another that can be run.
+  const Feasibility feasibility =
+      feasibleWhere([](const auto& set) { return std::abs(set[1] - 0.5) < 0.04; }, "b is 0.5");
+  const EffectPlan plan = planEffects({.trajectories = 4}, space, distributions, 1, feasibility);
+  EXPECT_EQ(plan.infeasiblePoints, 0U);
+  EXPECT_EQ(infeasiblePointsText(plan, std::vector<std::string>{"a", "b"}),
+            "Of some parameters no step that can be run was found; one that was tried: b is 0.5\n"
+            "   Parameters that lack effects, in how many trajectories: b (4 of 4)");
+}
+
 class CountingEvaluator final : public Evaluator {
  public:
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode) override {

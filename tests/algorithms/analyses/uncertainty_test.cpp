@@ -159,6 +159,15 @@ TEST(DistributionWarnings, AreOfMeansOutsideTheBoundsAndOfMostValuesThere) {
   const SearchSpace equal{.names = {"x"}, .lower = {0.5}, .upper = {0.5}, .transformation = {TransformationType::none}};
   EXPECT_THAT(distributionWarnings(ParameterDistributions(std::vector{uniformDistribution(0.5, 0.5)}), equal),
               ElementsAre("x has one value alone, 0.5, and is not varied: its bounds are equal"));
+  constexpr std::size_t kMany = 60;
+  const SearchSpace many{.names = std::vector<std::string>(kMany, "x"),
+                         .lower = std::vector<double>(kMany, 0.0),
+                         .upper = std::vector<double>(kMany, 1.0),
+                         .transformation = std::vector<TransformationType>(kMany, TransformationType::none)};
+  const std::vector<std::string> told =
+      distributionWarnings(ParameterDistributions(std::vector(kMany, uniformDistribution(5.0, 6.0))), many);
+  ASSERT_EQ(told.size(), 51U);
+  EXPECT_EQ(told.back(), "The distributions of 10 more parameters fit their bounds as little");
 }
 
 }  // namespace

@@ -412,5 +412,44 @@ TEST(DreamSampler, AnEstimatedErrorHasItsOwnPosteriorWithoutFurtherRuns) {
   EXPECT_GT(states, 1.05 * sampler.runs());
 }
 
+// The likelihood has the whole part of a dimension: the chains agree or not by it.
+TEST(DreamSampler, ChainsAreComparedByTheValuesThatAreUsed) {
+  const auto checkOf = [](double width, bool hasSteps) {
+    DreamProblem problem = sampledFunction({0.0, -5.0}, {4.0, 5.0}, [=](std::span<const double> x) {
+      const double difference = (std::floor(x[0]) - 2.0) / width;
+      return -0.5 * (difference * difference + x[1] * x[1]);
+    });
+    if (hasSteps) problem.usedValue = [](std::size_t j, double value) { return j == 0 ? std::floor(value) : value; };
+    const DreamSampler sampler = sampled(untilBudget(2'000), std::move(problem));
+    const std::size_t draws = (sampler.history().generations() - *sampler.burnIn()) * sampler.history().chainCount();
+    return std::pair(*sampler.checkNow(), static_cast<double>(draws));
+  };
+  const auto [known, draws] = checkOf(0.01, true);  // the other steps are as good as impossible
+  EXPECT_EQ(known.rHat[0], 1.0);
+  EXPECT_EQ(known.effectiveSizes[0], draws);
+  EXPECT_GT(known.rHat[1], 1.0);
+  const ConvergenceCheck hidden = checkOf(0.01, false).first;
+  EXPECT_GT(hidden.rHat[0], 1.0);
+  EXPECT_EQ(hidden.rHat[1], known.rHat[1]) << "the chains are the same";
+  const auto [several, of] = checkOf(1.0, true);
+  EXPECT_LT(several.rHat[0], 1.1);
+  EXPECT_LT(several.effectiveSizes[0], of);
+}
+
+TEST(DreamSampler, AStepOnWhichChainsStandStillIsNotKnown) {
+  DreamProblem problem = sampledFunction({0.0}, {1.0}, [](auto) { return 0.0; });
+  problem.usedValue = [](std::size_t, double) { return 0.0; };
+  problem.evaluate = [number = 0](std::span<const DreamProposal> proposals) mutable {
+    std::vector<ProposalResult> results;  // each better than what follows, which is never accepted
+    for (std::size_t i = 0; i < proposals.size(); ++i) {
+      ++number;
+      results.push_back({-1e6 * number, number});
+    }
+    return results;
+  };
+  const DreamSampler sampler = sampled(untilBudget(400), std::move(problem));
+  EXPECT_FALSE(sampler.checkNow()->largestRHat() <= 1e9);
+}
+
 }  // namespace
 }  // namespace mirevo

@@ -76,7 +76,7 @@ TEST(Posterior, IsOfTheStatesBehindBurnInAndTheAcceptanceRateOfTheirProposals) {
 TEST(Posterior, IsSaidNotToBeThereOrNotToHaveConverged) {
   ShownChains shown;
   const std::vector<std::string> none = shown.report(nullptr, {.failed = 1, .untransformed = 3});
-  EXPECT_THAT(none, ::testing::Contains(::testing::StartsWith("4 model runs without a likelihood, whose sets were "
+  EXPECT_THAT(none, ::testing::Contains(::testing::StartsWith("4 evaluations without a likelihood, whose sets were "
                                                               "rejected: 1 failed; 3 have simulated values without")));
   EXPECT_THAT(none, ::testing::Contains(::testing::HasSubstr("No posterior: there are fewer than 4 generations")));
   auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior, 1000);
@@ -119,7 +119,7 @@ TEST(Posterior, IsNotOfStatesWithoutALikelihood) {
       reportOf(nowhere, nothing),
       ::testing::ElementsAre(
           ::testing::_, ::testing::_,
-          ::testing::AllOf(::testing::StartsWith("Warning: No posterior: none of the 399 model runs "),
+          ::testing::AllOf(::testing::StartsWith("Warning: No posterior: none of the 399 evaluations "),
                            ::testing::HasSubstr("has a likelihood: 300 have simulated values without a Box-Cox"),
                            ::testing::HasSubstr("; 100 have no finite errors"),
                            ::testing::HasSubstr(". Zeros have a transformation with"),

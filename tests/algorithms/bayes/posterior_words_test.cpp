@@ -16,7 +16,7 @@ TEST(PosteriorWords, DoNotTellSizesThatRoundingMakes) {
   EXPECT_EQ(rHatText(1.0123), "1.01");
   EXPECT_EQ(rHatText(1.0123, 4), "1.012");
   EXPECT_EQ(rHatText(1.3e7, 4), "over 1000");
-  EXPECT_EQ(rHatText(INFINITY, 4), "over 1000");
+  EXPECT_EQ(rHatText(INFINITY, 4), "not finite: chains stand still");
 }
 
 TEST(PosteriorWords, SayWhatIsWorstAndWhatToDo) {

@@ -97,6 +97,36 @@ TEST_F(RestartSettingsTest, AnObjectiveFunctionIsTheSameByNameAndByNumber) {
   EXPECT_THAT(changes("'flow'", "'flow'", "'FLOW'"), testing::Contains(testing::StartsWith("Name of")));
 }
 
+TEST_F(RestartSettingsTest, WhatMeansTheSameIsNoChange) {
+  const auto settings = [](const std::string& section, const std::string& keyword, const std::string& value) {
+    RestartSettings all;
+    all.settings = {{"MODEL_PARAMETERS/PARAMETER_1", "Parameter_Name", "'Rate'"},
+                    {"MODEL_PARAMETERS/PARAMETER_2", "Parameter_Name", "'rate 2'"},
+                    {section, keyword, value}};
+    return all;
+  };
+  const std::string pair = "UNCERTAINTY_ESTIMATION/CORRELATIONS/PAIR_1";
+  const struct {
+    std::string section;
+    const char* keyword;
+    const char* then;
+    const char* now;
+    bool isSame;
+  } cases[] = {{pair, "First_Parameter", "'Rate'", "'RATE '", true},
+               {pair, "Second_Parameter", "'RATE 2'", "'rate 2'", true},
+               {pair, "First_Parameter", "'Rate'", "'rate 2'", false},
+               {pair, "First_Parameter", "'Rate", "'Depth'", false},
+               {"UNCERTAINTY_ESTIMATION", "Random_Seed", "1", "-1", true},
+               {"SENSITIVITY_ANALYSIS", "Random_Seed", "-7", "7", true},
+               {"UNCERTAINTY_ESTIMATION", "Random_Seed", "1", "-2", false},
+               {"INITIAL_SAMPLE", "Random_Seed", "1", "-1", false}};
+  for (const auto& one : cases) {
+    const auto changes =
+        changedSettings(settings(one.section, one.keyword, one.then), settings(one.section, one.keyword, one.now));
+    EXPECT_EQ(changes.empty(), one.isSame) << one.keyword << " " << one.then << " " << one.now;
+  }
+}
+
 TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDefaultDoes) {
   const RestartSettings now = restartSettings(read());
   RestartSettings then = now;
