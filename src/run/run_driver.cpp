@@ -165,6 +165,11 @@ void RunDriver::openRun(const std::string& setupFileName) {
 /// In the log and to the user.
 void RunDriver::warn(std::string_view text) {
   state_.log.warning(text);
+  tellWarning(text);
+}
+
+void RunDriver::tellWarning(std::string_view text) {
+  lastTold_ = text;
   showMessage(text, {}, MessageType::warning);
 }
 
@@ -531,7 +536,7 @@ void RunDriver::tellOfWarnings() const {
   showMessage(fmt::format("{} in {}{}: {}", warningCountText(), state_.log.path(),
                           state_.log.warningCount() == 1 ? "" : "; the first", state_.log.warnings().front()),
               {}, MessageType::warning);
-  if (state_.log.warningCount() > 1) {
+  if (state_.log.warningCount() > 1 && state_.log.lastWarning() != lastTold_) {
     showMessage("The last of them: " + state_.log.lastWarning(), {}, MessageType::warning);
   }
 }
@@ -559,9 +564,9 @@ void RunDriver::logDifferences() {
 }
 
 /// After the message that ends an unfinished run, which is the first thing that the user reads.
-void RunDriver::tellOfBestThatDiffers() const {
+void RunDriver::tellOfBestThatDiffers() {
   if (!reporter_) return;
-  for (const std::string& text : reporter_->differencesOfBest()) showMessage(text, {}, MessageType::warning);
+  for (const std::string& text : reporter_->differencesOfBest()) tellWarning(text);
 }
 
 /// Nothing that goes wrong here may hide why the run ended.

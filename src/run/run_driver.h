@@ -87,7 +87,8 @@ class RunDriver final {
   void finishHook(std::string_view state);
   void logFailures();
   void logDifferences();
-  void tellOfBestThatDiffers() const;
+  void tellOfBestThatDiffers();
+  void tellWarning(std::string_view text);
   int endInError(std::string_view message, std::string_view detail);
   void endLogInError(std::string_view message, std::string_view details);
   void closeLog();
@@ -124,6 +125,7 @@ class RunDriver final {
   std::unique_ptr<Evaluator> evaluator_;
   std::optional<TaskOutcome> outcome_;  ///< of the task, once it has come to its end
   bool hasLoggedDifferences_ = false;
+  std::string lastTold_;  ///< the warning that the user was told last
 };
 
 }  // namespace mirevo

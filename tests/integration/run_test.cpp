@@ -67,9 +67,7 @@ TEST(Optimisation, OfEqualSetsTheResultsNameTheOneThatTheSearchTookAndUnusedPara
   const std::string report = folder.read("basin_Report.html");
   EXPECT_THAT(run.error,
               AllOf(StartsWith("Mirevo: All 11 successful model runs so far have the same output measures"),
-                    HasSubstr(fmt::format("\nMirevo: 4 warnings in {}; the first: {}\nMirevo: The last of them: "
-                                          "All 11 successful model runs so far",
-                                          folder / "basin.log", first))));
+                    EndsWith(fmt::format("\nMirevo: 4 warnings in {}; the first: {}\n", folder / "basin.log", first))));
   EXPECT_THAT(folder.read("basin._spi_"), HasSubstr("\nMESSAGWarning: " + first + "\n"));
   EXPECT_THAT(report, HasSubstr("Warning: the variable parameter \\\"a\\\" is in no template"));
   EXPECT_THAT(log, HasSubstr("\n4 warnings: the lines above that begin with"));
