@@ -169,7 +169,7 @@ void RunDriver::warn(std::string_view text) {
 }
 
 void RunDriver::tellWarning(std::string_view text) {
-  lastTold_ = text;
+  state_.lastTold = text;
   showMessage(text, {}, MessageType::warning);
 }
 
@@ -536,7 +536,7 @@ void RunDriver::tellOfWarnings() const {
   showMessage(fmt::format("{} in {}{}: {}", warningCountText(), state_.log.path(),
                           state_.log.warningCount() == 1 ? "" : "; the first", state_.log.warnings().front()),
               {}, MessageType::warning);
-  if (state_.log.warningCount() > 1 && state_.log.lastWarning() != lastTold_) {
+  if (state_.log.warningCount() > 1 && state_.log.lastWarning() != state_.lastTold) {
     showMessage("The last of them: " + state_.log.lastWarning(), {}, MessageType::warning);
   }
 }

@@ -125,7 +125,6 @@ class RunDriver final {
   std::unique_ptr<Evaluator> evaluator_;
   std::optional<TaskOutcome> outcome_;  ///< of the task, once it has come to its end
   bool hasLoggedDifferences_ = false;
-  std::string lastTold_;  ///< the warning that the user was told last
 };
 
 }  // namespace mirevo

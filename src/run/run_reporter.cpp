@@ -55,6 +55,7 @@ void RunReporter::warning(std::string_view text) {
 
 void RunReporter::urgentWarning(std::string_view text) {
   state_.log.warning(text);
+  state_.lastTold = text;
   showMessage(text, {}, MessageType::warning);
 }
 

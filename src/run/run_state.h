@@ -3,6 +3,7 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <string>
 #include <vector>
 
 #include "common/clock.h"
@@ -24,6 +25,7 @@ struct RunState {
   std::optional<double> workersStopped;  ///< when they were told to
   RunLog log;
   ProgressReporter progress{runTimeClock};
+  std::string lastTold;                 ///< the warning that the user was told last
   std::vector<double> objectiveValues;  ///< of the last model run, one per objective function
 };
 

@@ -103,12 +103,14 @@ void SetupCheck::runModel() {
   settings.warn = warnAbout;
   ModelRunner runner(std::move(model), parameters, aggregator, launcher, settings);
   for (const std::string& text : modelDoubts(config_, parameters, runner)) warnAbout(text);
-  if (config_.task) {
-    config_.task->requireObservations(parameters.searchSpace(), config_.measures, config_.objectives,
-                                      runner.output().observedSeries());
-  }
   const std::string folder = launcher.getProcessFolder(1);
+  isRun_ = false;
   try {
+    if (config_.task) {
+      config_.task->requireObservations(parameters.searchSpace(), config_.measures, config_.objectives,
+                                        runner.output().observedSeries());
+    }
+    isRun_ = true;
     tryModel(parameters, runner, launcher);
   } catch (const FatalError& error) {
     if (!isRun_) {

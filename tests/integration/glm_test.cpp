@@ -93,6 +93,10 @@ TEST_F(GlmRun, OfAnInterruptedRunTellsTheCovarianceAndARestartGoesOn) {
       EXPECT_THAT(folder_.read(kTables[0]), HasSubstr("# Unfinished run"));
     }
     std::filesystem::remove(folder_ / "hold");
+    folder_.editSetup("Restart = 0", "Restart = 1");
+    ASSERT_EQ(runProgram({setup_}).exitCode, 0) << log();
+    EXPECT_THAT(log(), HasSubstr(fmt::format("Restart: {} evaluations are taken from", rows)));
+    EXPECT_EQ(files(), expected);
   }
 }
 

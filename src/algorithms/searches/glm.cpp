@@ -30,7 +30,11 @@ constexpr int kSmallChanges = 2;
 /// And such iterations whose steps constraints have stopped, after which the run ends without having converged.
 constexpr int kStoppedChanges = 5;
 constexpr double kLeastLambda = 1.0e-10;
-constexpr std::string_view kStopped = "constraints stop its steps, which need not be a minimum";
+/// A step neither side of which can be run is shortened so often, each time to this share.
+constexpr std::size_t kMostShortenings = 5;
+constexpr double kShortening = 0.25;
+constexpr std::string_view kNeitherSide = "neither side";
+constexpr std::string_view kStopped = "constraints or equations stop its steps, which need not be a minimum";
 
 double sumOfSquares(std::span<const double> values) {
   double sum = 0.0;
@@ -220,6 +224,15 @@ void Glm::endRun(std::string_view reason) {
     for (const std::string& name : stoppedBy_) names += (names.empty() ? "" : ", ") + name;
     note("Its last trial sets were stopped by " + names);
   }
+  std::string unknown;
+  for (std::size_t j = 0; differences_ && j < differences_->problems.size(); ++j) {
+    if (differences_->problems[j].empty()) continue;
+    unknown += (unknown.empty() ? "" : ", ") + problem_.residuals->space.names[j];
+  }
+  if (!unknown.empty()) {
+    note(fmt::format("Warning: Run {} of GLM need not have come to a minimum: the derivatives by {} are not known",
+                     runCount_, unknown));
+  }
   if (!starts_.empty()) {
     startNext();
   } else {
@@ -228,15 +241,56 @@ void Glm::endRun(std::string_view reason) {
   }
 }
 
+/// The differences at the current set. Where neither side of a parameter's step can be run the step is shortened; if
+/// that does not help, the parameter has no difference.
+PerturbationPlan Glm::planDifferences() const {
+  const ResidualProblem& residuals = *problem_.residuals;
+  const Feasibility& feasibility = problem_.feasibility;
+  const auto planWith = [&](double share) {
+    SensitivitySettings settings;
+    settings.differencing = isCentral_ ? Differencing::central : Differencing::forward;
+    settings.perturbationOption = settings_.perturbationOption;
+    settings.perturbationFraction = share * settings_.perturbationFraction;
+    return planPerturbations(settings, residuals.space, current_->set, residuals.fields, feasibility);
+  };
+  std::vector<PerturbationPlan> plans{planWith(1.0)};
+  if (!feasibility.isTested()) return std::move(plans.front());
+  PerturbationPlan runnable;
+  runnable.sets.push_back(plans.front().sets.front());
+  for (std::size_t j = 0; j < problem_.bounds.size(); ++j) {
+    ParameterDifference difference;
+    std::optional<std::string> violation;
+    double share = 1.0;
+    for (std::size_t k = 0; k <= kMostShortenings; ++k, share *= kShortening) {
+      if (k == plans.size()) plans.push_back(planWith(share));
+      const PerturbationPlan& plan = plans[k];
+      difference = plan.differences[j];
+      const auto violationOf = [&](std::size_t set) {
+        return set == 0 ? std::nullopt : feasibility.violation(plan.sets[set]);
+      };
+      violation = difference.problem.empty() ? violationOf(difference.minus) : std::nullopt;
+      if (!violation && difference.problem.empty()) violation = violationOf(difference.plus);
+      if (violation) continue;
+      for (std::size_t* const side : {&difference.minus, &difference.plus}) {
+        if (*side == 0 || !difference.problem.empty()) continue;
+        runnable.sets.push_back(plan.sets[*side]);
+        *side = runnable.sets.size() - 1;
+      }
+      break;
+    }
+    if (violation) {
+      difference.minus = difference.plus = 0;
+      difference.problem = fmt::format("{} of its step can be run ({})", kNeitherSide, *violation);
+    }
+    runnable.differences.push_back(std::move(difference));
+  }
+  return runnable;
+}
+
 /// Runs the sets of the differences and takes the columns; false if the budget ends before.
 bool Glm::makeJacobian() {
   const ResidualProblem& residuals = *problem_.residuals;
-  SensitivitySettings settings;
-  settings.differencing = isCentral_ ? Differencing::central : Differencing::forward;
-  settings.perturbationOption = settings_.perturbationOption;
-  settings.perturbationFraction = settings_.perturbationFraction;
-  PerturbationPlan plan =
-      planPerturbations(settings, residuals.space, current_->set, residuals.fields, problem_.feasibility);
+  PerturbationPlan plan = planDifferences();
   const std::vector<std::optional<Point>> points = run(std::span(plan.sets).subspan(1));
   if (points.size() + 1 < plan.sets.size()) {
     noteDifferences(points);
@@ -272,7 +326,8 @@ bool Glm::makeJacobian() {
       jacobian_[j] = std::move(columns[j]);
       continue;
     }
-    const bool hasPrevious = !isFirst && difference.problem.empty() && sumOfSquares(jacobian_[j]) > 0.0;
+    const bool canHavePrevious = difference.problem.empty() || difference.problem.starts_with(kNeitherSide);
+    const bool hasPrevious = !isFirst && canHavePrevious && sumOfSquares(jacobian_[j]) > 0.0;
     note(fmt::format(
         "Iteration {}: no derivatives by {}, as {}; {}", iteration_, residuals.space.names[j], problem,
         hasPrevious ? "those of the iteration before are used, updated after Broyden" : "the parameter is held"));
@@ -344,6 +399,13 @@ std::vector<double> Glm::lambdas(int attempt) const {
   return found;
 }
 
+/// What keeps the set from being run.
+std::vector<std::string> Glm::stoppersOf(const ParameterSet& set) const {
+  std::vector<std::string> texts = constraints_.violatedTexts(set);
+  if (texts.empty()) texts.emplace_back("equations without a finite value");
+  return texts;
+}
+
 /// One set for each lambda, but for those that others have led to.
 std::vector<ParameterSet> Glm::trialSets(GlmLinearModel& model, std::span<const double> lambdas,
                                          std::vector<Trial>& trials) {
@@ -352,10 +414,7 @@ std::vector<ParameterSet> Glm::trialSets(GlmLinearModel& model, std::span<const 
     ParameterSet wanted = constraints_.led(
         [&](std::span<const LinearConstraint> kept) { return model.setFor(lambda, kept); }, current_->set);
     const bool isStopped = !problem_.feasibility.holds(wanted);
-    if (isStopped) {
-      stoppedBy_ = constraints_.violatedTexts(wanted);
-      if (stoppedBy_.empty()) stoppedBy_.emplace_back("equations without a finite value");
-    }
+    if (isStopped) stoppedBy_ = stoppersOf(wanted);
     ParameterSet set = feasible_.drawnBack(std::move(wanted), {current_->set});
     if (set == current_->set || std::ranges::find(sets, set) != sets.end()) continue;
     sets.push_back(std::move(set));
@@ -377,7 +436,8 @@ SearchStatus Glm::advance() {
   stoppedBy_.clear();
   GlmLinearModel model = linearModel();
   if (model.largestCosine(constraints_.holding(current_->set)) < settings_.minGradient) {
-    refineOr("the gradient is negligible");
+    const bool isWhole = std::ranges::all_of(differences_->problems, &std::string::empty);
+    refineOr(isWhole ? "the gradient is negligible" : "the gradient is negligible where it is known");
     return kSearchOk;
   }
   for (int attempt = 0; attempt < kMostAttempts; ++attempt) {
@@ -436,6 +496,7 @@ void Glm::correctTrials(GlmLinearModel& model, std::vector<std::optional<Point>>
     ParameterSet wanted = constraints_.movedInside(
         model.correctedSet(lambda, points[i]->set, jacobian_, lack, constraints_.holding(points[i]->set)));
     const bool isStopped = trials[i].isStopped || !problem_.feasibility.holds(wanted);
+    if (isStopped && stoppedBy_.empty()) stoppedBy_ = stoppersOf(wanted);
     ParameterSet set = feasible_.drawnBack(std::move(wanted), {current_->set});
     if (set == points[i]->set || set == current_->set || std::ranges::find(sets, set) != sets.end()) continue;
     sets.push_back(std::move(set));
@@ -509,7 +570,7 @@ void Glm::accept(Point point, const Trial& trial, double expected) {
                    : isCentral_                                                        ? "central differences"
                                                                                        : "forward differences",
                    formatReal(trial.lambda), formatReal(point.sum), 100.0 * share,
-                   trial.isStopped ? ", where constraints stop the step" : ""));
+                   trial.isStopped ? ", where constraints or equations stop the step" : ""));
   noteBest(point);
   current_ = std::move(point);
   leastOfRuns_ = std::min(leastOfRuns_, current_->sum);
@@ -524,17 +585,21 @@ void Glm::judge(double reduction, double step, bool isAsExpected, bool isStopped
     return;
   }
   const bool isSmall = reduction < problem_.stopping.minChange;
+  const bool isFresh = updates_ == 0;
   if (isStopped) {  // its length tells nothing of a minimum
     ++updates_;
     needsJacobian_ = updates_ > settings_.broydenUpdates || !isAsExpected;
     smallChanges_ = 0;
     stoppedChanges_ = isSmall || step < settings_.minStep ? stoppedChanges_ + 1 : 0;
-    if (stoppedChanges_ >= kStoppedChanges) refineOr(kStopped);
+    if (stoppedChanges_ < kStoppedChanges) return;
+    if (isFresh) updates_ = 0;  // this step's derivatives were made for it
+    const int count = stoppedChanges_;
+    refineOr(kStopped);
+    if (!isFresh) stoppedChanges_ = count;  // the next step, with derivatives of its own, decides
     return;
   }
   stoppedChanges_ = 0;
   smallChanges_ = isSmall ? smallChanges_ + 1 : 0;
-  const bool isFresh = updates_ == 0;
   ++updates_;
   needsJacobian_ = updates_ > settings_.broydenUpdates || !isAsExpected;
   if (step < settings_.minStep || smallChanges_ >= kSmallChanges) {

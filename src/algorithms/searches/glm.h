@@ -78,12 +78,14 @@ class Glm final : public SearchAlgorithm {
   bool isProblemValid() const;
   /// Fewer results than sets if the budget is used up.
   std::vector<std::optional<Point>> run(std::span<const ParameterSet> sets);
+  PerturbationPlan planDifferences() const;
   bool makeJacobian();
   void noteDifferences(std::span<const std::optional<Point>> points);
   GlmLinearModel linearModel() const;
   std::vector<double> lambdas(int attempt) const;
   std::vector<ParameterSet> trialSets(GlmLinearModel& model, std::span<const double> lambdas,
                                       std::vector<Trial>& trials);
+  std::vector<std::string> stoppersOf(const ParameterSet& set) const;
   /// Runs the trial sets again, corrected for the curvature that they have shown. May replace the best of them.
   void correctTrials(GlmLinearModel& model, std::vector<std::optional<Point>>& points, std::vector<Trial>& trials);
   void accept(Point point, const Trial& trial, double expected);

@@ -313,7 +313,7 @@ std::span<const double> OptimisationTask::referencePoint() const {
 /// Why a search has ended, and what is to be said of its course.
 void OptimisationTask::logEnd(const TaskContext& context, const SearchSummary& summary,
                               const std::vector<std::string>& course) const {
-  for (const std::string& note : summary.notes) context.log.line(note);
+  for (const std::string& note : summary.notes) context.log.reportLine(note);
   context.log.line(summary.terminationMessage);
   if (!summary.failure.empty()) {
     if (repetitions.count > 1) context.log.warning(summary.failure + ": " + summary.failureDetail);

@@ -15,6 +15,7 @@
 namespace mirevo {
 namespace {
 
+using ::testing::AllOf;
 using ::testing::DoubleNear;
 using ::testing::Each;
 using ::testing::HasSubstr;
@@ -443,6 +444,27 @@ TEST(Glm, GoesAlongACurvedConstraint) {
   const GlmTrial whole = glmSearch({{-5, -5}, {5, 5}, {-1.2, 1.0}}, valley, c);
   EXPECT_THAT(whole.summary.best, Pointwise(DoubleNear(1e-6), {1.0, 1.0})) << notesOf(whole);
   EXPECT_THAT(notesOf(whole), Not(HasSubstr("constraint")));
+}
+
+/// A band narrower than the steps of the differences, and an equation, within which there is no step.
+TEST(Glm, ShortensDifferencesThatLeaveNoRoomAndSaysWhereThereAreNone) {
+  GlmConditions c;
+  c.settings.minGradient = 1e-8;
+  const auto outside = [](const ParameterSet& s) { return std::vector{s[0] - 3.0, s[1] - 1.0}; };
+  const SearchBounds bounds{{-5, -5}, {5, 5}, {1.0, 0.5}};
+  c.margins = [](const ParameterSet& s) { return ParameterSet{s[0] + s[1] - 1.49, 1.51 - s[0] - s[1]}; };
+  const GlmTrial band = glmSearch(bounds, outside, c);
+  EXPECT_THAT(band.summary.best, Pointwise(DoubleNear(1e-6), {1.755, -0.245})) << notesOf(band);
+  for (const auto& batch : band.batches) {
+    for (const ParameterSet& set : batch) EXPECT_TRUE(feasibilityOf(c).holds(set));
+  }
+  c.margins = [](const ParameterSet& s) { return ParameterSet{s[0] + s[1] - 1.5, 1.5 - s[0] - s[1]}; };
+  const GlmTrial equation = glmSearch(bounds, outside, c);
+  EXPECT_EQ(equation.batches.size(), 1U);
+  EXPECT_THAT(
+      notesOf(equation),
+      AllOf(HasSubstr("Warning: Run 1 of GLM need not have come to a minimum: the derivatives by p1, p2 are not"),
+            HasSubstr("as the gradient is negligible where it is known")));
 }
 
 /// A parameter that no observation sees makes way for one that all see.
