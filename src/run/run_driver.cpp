@@ -355,7 +355,8 @@ TaskContext RunDriver::taskContext() {
           },
           config_.validationPeriods,
           [this](const std::string& file) {
-            return readEarlierSample(file, config_, parameters_->searchSpace(), runner_->output().observedSeries());
+            return readEarlierSample(file, config_, parameters_->searchSpace(), parameters_->feasibility(),
+                                     runner_->output().observedSeries());
           },
           runner_->output().validationObservations(),
           config_.aggregationMethod};

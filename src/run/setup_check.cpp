@@ -49,7 +49,8 @@ class SetupCheck final {
     print(record);
   }
   void runModel();
-  void checkEarlierResults(const SearchSpace& space, std::span<const ObservedSeries> observed);
+  void checkEarlierResults(const SearchSpace& space, const Feasibility& feasibility,
+                           std::span<const ObservedSeries> observed);
   /// Throws FatalError if the run yields no result.
   void judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set, std::string_view what);
   EvaluationResult resultOf(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set);
@@ -121,7 +122,7 @@ void SetupCheck::runModel() {
     fatalError(error.message(), error.detail().empty() ? kept : error.detail() + "\n" + kept);
   }
   removeTree(folder);  // while it is still locked
-  checkEarlierResults(parameters.searchSpace(), runner.output().observedSeries());
+  checkEarlierResults(parameters.searchSpace(), parameters.feasibility(), runner.output().observedSeries());
 }
 
 /// With the initial values; where these cannot be run and the task does without them, with a set of the task.
@@ -145,10 +146,11 @@ void SetupCheck::tryModel(ParameterModel& parameters, ModelRunner& runner, Proce
 }
 
 /// Of a task that judges the evaluations of an earlier run.
-void SetupCheck::checkEarlierResults(const SearchSpace& space, std::span<const ObservedSeries> observed) {
+void SetupCheck::checkEarlierResults(const SearchSpace& space, const Feasibility& feasibility,
+                                     std::span<const ObservedSeries> observed) {
   const std::string file = config_.task ? config_.task->earlierResultFile() : std::string();
   if (file.empty()) return;
-  const EarlierSample earlier = readEarlierSample(file, config_, space, observed);
+  const EarlierSample earlier = readEarlierSample(file, config_, space, feasibility, observed);
   for (const std::string& text : earlier.notes) print(text);
   for (const std::string& text : earlier.warnings) log_.warning(text);
 }

@@ -8,9 +8,11 @@
 #include <fmt/core.h>
 
 #include "common/named_items.h"
+#include "common/parameter_set.h"
 #include "common/short_list.h"
 #include "common/text.h"
 #include "evaluation/failed_run_policy.h"
+#include "parameters/search_space.h"
 
 namespace mirevo {
 namespace {
@@ -81,6 +83,42 @@ std::string otherBoundsText(const std::string& resultFile, const std::optional<R
   if (changed.isEmpty()) return fmt::format("{}: {}. {}", resultFile, where, kWhatCounts);
   return fmt::format("The run that made {} had other bounds: {}. {}. {}", resultFile, changed.text(), where,
                      kWhatCounts);
+}
+
+std::vector<std::string> otherSetsTexts(const std::string& resultFile, const RunConfig& config,
+                                        const Feasibility& feasibility, const EvaluatedSample& sample) {
+  std::vector<const ModelParameter*> variable;
+  for (const ModelParameter& parameter : config.parameters) {
+    if (parameter.parameterType == ParameterType::variable) variable.push_back(&parameter);
+  }
+  std::size_t betweenIntegers = 0;
+  std::size_t violating = 0;
+  std::string violation;
+  for (std::size_t i = 0; i < sample.size(); ++i) {
+    if (!sample.ok[i]) continue;
+    bool isOnGridOfAll = true;
+    ParameterSet set;
+    for (std::size_t j = 0; j < variable.size(); ++j) {
+      const double value = sample.parameters[j][i];
+      isOnGridOfAll = isOnGridOfAll && isOnGrid(*variable[j], value);
+      bool failed = false;  // of a logarithm, outside the bounds
+      const bool isLogarithmic = variable[j]->transformationType == TransformationType::logarithmic;
+      set.push_back(isLogarithmic ? TransformParameterValue(value, 0.0, TransformationType::logarithmic,
+                                                            TransformDirection::forward, failed)
+                                  : value);
+    }
+    if (!isOnGridOfAll) ++betweenIntegers;
+    const auto found = isOnGridOfAll ? feasibility.violation(set) : std::nullopt;
+    if (found && ++violating == 1) violation = *found;
+  }
+  std::vector<std::string> texts;
+  const auto tell = [&](std::size_t count, std::string_view why) {
+    texts.push_back(fmt::format("{}: {} of its {} sets would not be made by a run of this setup, {}. All are judged",
+                                resultFile, count, sample.size(), why));
+  };
+  if (betweenIntegers > 0) tell(betweenIntegers, "with values between those of an integer parameter");
+  if (violating > 0) tell(violating, "as they violate a constraint (" + violation + ")");
+  return texts;
 }
 
 std::vector<std::string> unfinishedRunTexts(const std::string& resultFile, const std::optional<RunRecord>& record,

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "algorithms/analyses/evaluated_sample.h"
+#include "parameters/feasibility.h"
 #include "run/results/restart_settings.h"
 #include "run/results/run_record.h"
 #include "run/setup/run_config.h"
@@ -16,6 +17,11 @@ namespace mirevo {
 /// is nothing to say.
 std::string otherBoundsText(const std::string& resultFile, const std::optional<RestartSettings>& then,
                             const RunConfig& config, const EarlierSample& earlier);
+
+/// That sets of successful evaluations have values between those of an integer parameter of the setup, and that they
+/// violate its constraints.
+std::vector<std::string> otherSetsTexts(const std::string& resultFile, const RunConfig& config,
+                                        const Feasibility& feasibility, const EvaluatedSample& sample);
 
 /// That the earlier run did not come to its end, and that more of its evaluations failed than a run may have. Nothing
 /// is said of an end that is not known, as the record of the run is not there.

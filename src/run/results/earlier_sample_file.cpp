@@ -239,7 +239,7 @@ void openValues(const std::string& resultFile, const ResultRows& rows, const Run
 }  // namespace
 
 EarlierSample readEarlierSample(const std::string& resultFile, const RunConfig& config, const SearchSpace& space,
-                                std::span<const ObservedSeries> observed) {
+                                const Feasibility& feasibility, std::span<const ObservedSeries> observed) {
   EarlierSample found;
   std::string reason;
   auto text = readTextFile(resultFile, reason);
@@ -258,6 +258,7 @@ EarlierSample readEarlierSample(const std::string& resultFile, const RunConfig& 
     if (!warning.empty()) found.warnings.push_back(std::move(warning));
   };
   add(otherBoundsText(resultFile, then, config, found));
+  for (std::string& doubt : otherSetsTexts(resultFile, config, feasibility, found.sample)) add(std::move(doubt));
   const std::string recordFile = pathBesideResults(resultFile, run_files::kPlain.record);
   for (std::string& doubt :
        unfinishedRunTexts(resultFile, readRunRecord(readFileIfThere(recordFile).value_or("")), found.sample)) {

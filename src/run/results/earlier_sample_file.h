@@ -5,6 +5,7 @@
 
 #include "algorithms/analyses/evaluated_sample.h"
 #include "measures/observed_series.h"
+#include "parameters/feasibility.h"
 #include "parameters/search_space.h"
 #include "run/setup/run_config.h"
 
@@ -15,6 +16,6 @@ namespace mirevo {
 /// if the file has other columns than this run would have, has rows that were changed, or was judged by other
 /// observations, measures or objective functions, and if it has no successful evaluation.
 EarlierSample readEarlierSample(const std::string& resultFile, const RunConfig& config, const SearchSpace& space,
-                                std::span<const ObservedSeries> observed);
+                                const Feasibility& feasibility, std::span<const ObservedSeries> observed);
 
 }  // namespace mirevo

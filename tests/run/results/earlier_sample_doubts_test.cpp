@@ -1,5 +1,6 @@
 #include "run/results/earlier_sample_doubts.h"
 
+#include <cmath>
 #include <optional>
 #include <string>
 #include <vector>
@@ -70,6 +71,27 @@ TEST(EarlierSampleDoubts, OtherBoundsAreToldWithTheSetsOutsideThem) {
     EXPECT_THAT(text, StartsWith(one.expected));
     EXPECT_EQ(text.empty(), one.expected[0] == '\0') << text;
   }
+}
+
+TEST(EarlierSampleDoubts, SetsThatTheSetupWouldNotMakeAreTold) {
+  EvaluatedSample sample;
+  EvaluationResult result;
+  for (const double steps : {1.0, 2.5, 3.0, 4.0}) sample.add(std::vector{steps, std::exp(steps)}, result);
+  result.failure = EvaluationFailure{};
+  sample.add(std::vector{5.0, 1.0}, result);  // one that failed was not judged
+  RunConfig config;
+  config.parameters = {boundedParameter("Steps", 0.0, 9.0), boundedParameter("Rate", 0.1, 99.0)};
+  config.parameters[1].transformationType = TransformationType::logarithmic;
+  EXPECT_THAT(otherSetsTexts("r.dat", config, Feasibility(), sample), IsEmpty());
+  config.parameters[0].transformationType = TransformationType::integer;
+  const Feasibility lessThan35(
+      [](std::span<const double> set) { return set[1] < 3.5 ? std::nullopt : std::optional<std::string>("too much"); });
+  EXPECT_THAT(
+      otherSetsTexts("r.dat", config, lessThan35, sample),
+      ElementsAre(
+          StartsWith("r.dat: 1 of its 5 sets would not be made by a run of this setup, with values between"),
+          StartsWith(
+              "r.dat: 1 of its 5 sets would not be made by a run of this setup, as they violate a constraint (too")));
 }
 
 TEST(EarlierSampleDoubts, AnUnfinishedRunAndManyFailuresAreTold) {
