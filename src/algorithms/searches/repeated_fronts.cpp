@@ -116,6 +116,8 @@ void RepeatedFronts::describe(const ParetoArchive& ofAll, std::span<const double
 std::vector<std::string> repeatedFrontLines(std::span<const Repetition> repetitions, const SearchSpace& space,
                                             std::span<const std::string> objectives, std::int32_t planned) {
   std::vector<std::string> lines = frontLines(repetitions, planned);
+  const std::string withoutText = withoutBestText(repetitions);
+  if (!withoutText.empty()) lines.push_back("Warning: " + withoutText);
   std::vector<const Repetition*> ended;
   std::vector<double> hypervolumes;
   for (const Repetition& one : repetitions) {

@@ -232,6 +232,21 @@ std::string sameSearchesText(std::span<const Repetition> repetitions) {
       groups);
 }
 
+std::string withoutBestText(std::span<const Repetition> repetitions) {
+  const auto isWithout = [](const Repetition& one) { return !one.termination.empty() && one.bestEvaluation == 0; };
+  std::vector<std::size_t> numbers;
+  for (std::size_t i = 0; i < repetitions.size(); ++i) {
+    if (isWithout(repetitions[i])) numbers.push_back(i + 1);
+  }
+  if (numbers.empty()) return {};
+  std::string named =
+      fmt::format("{}", fmt::join(std::span(numbers).first(std::min(numbers.size(), kMostNamed)), ", "));
+  if (numbers.size() > kMostNamed) named += fmt::format(" and {} more", numbers.size() - kMostNamed);
+  return fmt::format(
+      "{} of {} repetitions ended without a successful run and {} left out of what is said of all: No. {}",
+      numbers.size(), repetitions.size(), numbers.size() == 1 ? "is" : "are", named);
+}
+
 std::vector<std::string> repetitionLines(std::span<const Repetition> repetitions, const SearchSpace& space,
                                          std::span<const std::string> objectives, std::int32_t planned) {
   if (std::ranges::any_of(repetitions, [](const Repetition& one) { return one.front.has_value(); })) {
@@ -240,6 +255,8 @@ std::vector<std::string> repetitionLines(std::span<const Repetition> repetitions
   std::vector<std::string> lines = tableLines(repetitions, planned);
   const std::string sameText = sameSearchesText(repetitions);
   if (!sameText.empty()) lines.push_back("Warning: " + sameText);
+  const std::string withoutText = withoutBestText(repetitions);
+  if (!withoutText.empty()) lines.push_back("Warning: " + withoutText);
   const std::vector<int> same = sameSearches(repetitions);
   std::vector<const Repetition*> ended;
   for (std::size_t i = 0; i < repetitions.size(); ++i) {

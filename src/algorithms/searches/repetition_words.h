@@ -3,6 +3,7 @@
 // What the logs of repetitions of any search have in common.
 #include <cstddef>
 #include <cstdint>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -28,6 +29,9 @@ double rangeShare(const std::vector<const Repetition*>& repetitions, const Searc
 /// The parameters of these best sets on the model scale, each with its spread and share of its range, in percent.
 std::vector<std::vector<double>> parameterSpreads(const std::vector<const Repetition*>& repetitions,
                                                   const SearchSpace& space);
+
+/// Which of them ended without a successful run and count for nothing in what is said of all; empty if none did.
+std::string withoutBestText(std::span<const Repetition> repetitions);
 
 /// repetitionLines() of repetitions that have fronts.
 std::vector<std::string> repeatedFrontLines(std::span<const Repetition> repetitions, const SearchSpace& space,

@@ -319,10 +319,12 @@ TEST(Repetitions, OneThatHasNotEndedOrHasNoResultHasItsRowAndNoShareInTheSpread)
   all[1].loops = 0;
   all[2] = {3, 12, 0, std::numeric_limits<double>::quiet_NaN(), {}, 4, "Optimisation terminated: it failed"};
   const std::vector<std::string> lines = repetitionLines(all, repeatedSpace(), {}, 5);
-  ASSERT_EQ(lines.size(), 5U) << "one that has ended has no spread";
+  ASSERT_EQ(lines.size(), 6U) << "one that has ended has no spread";
   EXPECT_EQ(lines[0], "The 3 of 5 repetitions of the search that had begun:");
   EXPECT_THAT(lines[3], EndsWith("  has not ended"));
   EXPECT_THAT(lines[4], ::testing::ContainsRegex("^ +3 +3 +12 +none +it failed$"));
+  EXPECT_EQ(lines[5],
+            "Warning: 1 of 3 repetitions ended without a successful run and is left out of what is said of all: No. 3");
   EXPECT_THAT(dataTableText(repetitionTable(all, repeatedSpace())),
               EndsWith("Repetition\tSeed\tEvaluations\tBest_Evaluation\tAggregate\tLoops\tStart_Aggregate\ta\tk\t"
                        "Termination\n"
