@@ -279,11 +279,14 @@ TEST(GuardedNetcdf, AFileWhoseReaderIsKilledIsReadOnceMore) {
   const std::string link = folder / "simulated.nc";
   std::filesystem::create_symlink(files + "endless.nc", link);
   const auto reading = std::make_shared<SeriesReading>();
+  bool isKilled = false;
   reading->watch.begin(20.0, "20 seconds", [&] {
+    if (isKilled) return;  // a slow machine calls again while the second reader is at work
     std::ifstream children(fmt::format("/proc/self/task/{}/children", ::getpid()));
     for (pid_t child = 0; children >> child;) {
-      if (isHelperProcess(child)) ::kill(child, SIGKILL);
+      if (isHelperProcess(child) && ::kill(child, SIGKILL) == 0) isKilled = true;
     }
+    if (!isKilled) return;
     std::filesystem::remove(link);
     std::filesystem::create_symlink(files + "sound.nc", link);
   });

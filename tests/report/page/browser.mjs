@@ -1,5 +1,5 @@
 // A headless browser with a report in it. Environment: MIREVO_PAGE_PACKAGES (node_modules), MIREVO_PAGE_TEMPLATE, and MIREVO_BROWSER where
-// Chromium is not /usr/bin/chromium.
+// Chromium's headless shell is not /usr/bin/chromium-headless-shell.
 import { mkdtempSync, readFileSync, rmSync, writeFileSync } from 'node:fs';
 import { createRequire } from 'node:module';
 import { tmpdir } from 'node:os';
@@ -17,7 +17,7 @@ export function reportOf(data) {
 export async function openBrowser() {
   const folder = mkdtempSync(join(tmpdir(), 'mirevo-report-'));
   const browser = await chromium.launch({
-    executablePath: process.env.MIREVO_BROWSER ?? '/usr/bin/chromium',
+    executablePath: process.env.MIREVO_BROWSER ?? '/usr/bin/chromium-headless-shell',
     args: ['--no-sandbox', '--disable-gpu', '--disable-quic', '--no-first-run', '--disable-background-networking', '--disable-component-update', '--disable-sync'],
   });
 

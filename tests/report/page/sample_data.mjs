@@ -1,17 +1,10 @@
 // Reports of the small test model, made by the program (samples.cpp): what a run of each task and kind of trouble holds. Environment:
-// MIREVO_PAGE_SAMPLES. What would take days of model runs is stretched from a short one.
-import { execFileSync } from 'node:child_process';
-import { mkdtempSync, readdirSync, readFileSync, rmSync } from 'node:fs';
-import { tmpdir } from 'node:os';
+// MIREVO_PAGE_SAMPLES, their folder. What would take days of model runs is stretched from a short one.
+import { readFileSync } from 'node:fs';
 import { join } from 'node:path';
 
-const folder = mkdtempSync(join(tmpdir(), 'mirevo-samples-'));
-execFileSync(process.env.MIREVO_PAGE_SAMPLES, [folder]);
-const reports = Object.fromEntries(readdirSync(folder).map((name) => [name, readFileSync(join(folder, name), 'utf8')]));
-rmSync(folder, { recursive: true });
-
 /** The data in the report of that name, each time anew. */
-export const dataOf = (name) => JSON.parse(/id="report-data">(.*?)<\/script>/s.exec(reports[name])[1]);
+export const dataOf = (name) => JSON.parse(/id="report-data">(.*?)<\/script>/s.exec(readFileSync(join(process.env.MIREVO_PAGE_SAMPLES, name), 'utf8'))[1]);
 
 /** A search by few evaluations without failures, whose second measure compares a series of 40 days with a gap, and a parameter of another kind. */
 export function twoSeries() {

@@ -17,6 +17,7 @@ int main(int argc, char** argv) {
       {"scenarios", {.option = 0, .scenarios = scenarios(30)}},
       {"allFailed", {.option = 0, .scenarios = scenarios(30), .modelArguments = "--fail-above -1"}}};
   if (argc != 2) return 2;
+  std::filesystem::create_directories(argv[1]);
   for (const auto& [name, settings] : samples) {
     const ModelFolder folder;
     const std::string setup = folder.writeSetup(settings);
@@ -36,7 +37,8 @@ int main(int argc, char** argv) {
                                     text.substr(text.find("  [/UNCERTAINTY_ESTIMATION]")));
     }
     runProgram({setup});
-    std::filesystem::copy_file(folder / "basin_Report.html", std::string(argv[1]) + "/" + name);
+    std::filesystem::copy_file(folder / "basin_Report.html", std::string(argv[1]) + "/" + name,
+                               std::filesystem::copy_options::overwrite_existing);
   }
   return 0;
 }
