@@ -47,6 +47,13 @@ double drawGamma(double shape, ChainRandom& random) {
   }
 }
 
+/// The middle one, of an even number the upper of the two; `values` is not empty, and is put into another order.
+double middleOf(std::vector<double>& values) {
+  const auto middle = values.begin() + static_cast<std::ptrdiff_t>(values.size() / 2);
+  std::nth_element(values.begin(), middle, values.end());
+  return *middle;
+}
+
 }  // namespace
 
 const std::array<ErrorTermRow, kErrorTermCount>& errorTermRows() {
@@ -154,12 +161,18 @@ SeriesErrors::SeriesErrors(LikelihoodForm form, double shift, std::span<const do
       observed_(observed.begin(), observed.end()),
       weights_(weights.begin(), weights.end()) {
   countWhere(observed_);
+  std::vector<double> ofObservations;
+  if (!weights_.empty() && !counted_.empty()) {
+    for (const std::size_t t : counted_) ofObservations.push_back(weights_[t]);
+    usualWeight_ = middleOf(ofObservations);
+    for (std::size_t t = 0; t < weights_.size(); ++t) {
+      if (std::isnan(observed_[t])) weights_[t] = usualWeight_;
+    }
+  }
   std::vector<double> distances;
   for (std::size_t k = 1; k < counted_.size(); ++k) distances.push_back(days_[counted_[k]] - days_[counted_[k - 1]]);
   if (distances.empty()) return;
-  const auto middle = distances.begin() + static_cast<std::ptrdiff_t>(distances.size() / 2);
-  std::nth_element(distances.begin(), middle, distances.end());
-  if (*middle > 0.0) usualDistance_ = *middle;
+  if (const double middle = middleOf(distances); middle > 0.0) usualDistance_ = middle;
 }
 
 void SeriesErrors::countWhere(std::span<const double> simulated) {

@@ -102,12 +102,16 @@ class ErrorShape final {
 ///   e_t = T(y_t) - T(f'_t),   e_t = phi e_(t-1) + (sigma_0 + sigma_1 |f'_t|) a_t.
 /// phi is of the usual distance of observations; over another one it is raised to the power of the ratio and the
 /// innovation widened or narrowed accordingly, and the first e_t has the standard deviation of the stationary process:
-/// for normal errors of constant deviation this is exact. The deviation of an observation of weight w is divided by w.
+/// for normal errors of constant deviation this is exact. The deviation of an observation of weight w is divided by w,
+/// at a time without an observation by the median of the weights.
 class SeriesErrors final {
  public:
   /// `days` ascending; `observed` is NaN at times without an observation; `weights` is empty or has one per time.
   SeriesErrors(LikelihoodForm form, double shift, std::span<const double> days, std::span<const double> observed,
                std::span<const double> weights = {});
+
+  /// The weight of times without an observation, the median of those of the observations; 1 without weights.
+  double usualWeight() const { return usualWeight_; }
 
   /// The observations at which `simulated`, one value per time, has one count; the others do not, whatever a run has.
   void countWhere(std::span<const double> simulated);
@@ -162,6 +166,7 @@ class SeriesErrors final {
   std::vector<double> weights_;
   std::vector<std::size_t> counted_;  ///< times
   double usualDistance_ = 1.0;        ///< days
+  double usualWeight_ = 1.0;
 };
 
 }  // namespace mirevo

@@ -84,6 +84,20 @@ class BandReport {
     context_.log.warning(fmt::format("Band of total uncertainty of {}: {}", name, text));
   }
 
+  /// Says which errors a series has between its observations, if they have weights that differ.
+  void addUsualWeight(const ObservedSeries& observed, double weight) {
+    bool hasTimesBetween = false;
+    bool differs = false;
+    for (std::size_t t = 0; t < observed.weights.size(); ++t) {
+      const bool isBetween = std::isnan(observed.values[t]);
+      hasTimesBetween = hasTimesBetween || isBetween;
+      differs = differs || (!isBetween && observed.weights[t] != weight);
+    }
+    if (!hasTimesBetween || !differs) return;
+    lines.push_back(
+        fmt::format("   where nothing is observed, its errors are those of the median weight, {:.6g}", weight));
+  }
+
   std::vector<std::string> lines;
 
  private:
@@ -148,6 +162,7 @@ std::vector<std::string> reportPosteriorBands(const TaskContext& context, const 
       };
       report.add(observed, run_files::kTotalBand, "Band of total uncertainty",
                  seriesBand(observed.values, stateCount, observable));
+      report.addUsualWeight(observed, series->errors.usualWeight());
       report.addTimesWithoutErrors(context.measures[observed.measure].name, withoutErrors);
     }
     first += 2 * observed.values.size();

@@ -222,5 +222,27 @@ TEST(Likelihoods, PathsOfObservableValuesHaveTheModelsSpread) {
   }
 }
 
+TEST(Likelihoods, PathsOfWeightedObservationsHaveErrorsBetweenThemToo) {
+  const std::vector<double> observed{1.0, kMissing, 2.0, kMissing, kMissing, 4.0};
+  const std::vector<double> days{0.0, 1.0, 2.0, 3.0, 4.0, 5.0};
+  for (const double correlation : {0.0, 0.7}) {
+    const ErrorValues values = errors({{kDeviation, 0.5}, {kCorrelation, correlation}});
+    const auto drawn = [&](const std::vector<double>& weights) {
+      const SeriesErrors series(LikelihoodForm::normal, 0.0, days, observed, weights);
+      SeriesErrors::Path path(series, values);
+      ChainRandom random(5);
+      std::vector<double> found;
+      for (std::size_t t = 0; t < days.size(); ++t) found.push_back(path.next(t, 3.0, random) - 3.0);
+      return found;
+    };
+    const std::vector<double> plain = drawn({});
+    EXPECT_EQ(drawn({1.0, 0.0, 1.0, 0.0, 0.0, 1.0}), plain);
+    if (correlation > 0.0) continue;
+    const std::vector<double> weighted = drawn({2.0, 0.0, 8.0, 0.0, 0.0, 4.0});
+    const double expected[] = {2.0, 4.0, 8.0, 4.0, 4.0, 4.0};
+    for (std::size_t t = 0; t < days.size(); ++t) EXPECT_NEAR(weighted[t], plain[t] / expected[t], 1e-12) << t;
+  }
+}
+
 }  // namespace
 }  // namespace mirevo
