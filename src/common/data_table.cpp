@@ -7,6 +7,7 @@
 
 #include <fmt/core.h>
 
+#include "common/fatal_error.h"
 #include "common/text.h"
 #include "common/utf8.h"
 
@@ -159,9 +160,11 @@ std::optional<std::size_t> ReadTable::column(std::string_view name) const {
 
 ReadTable readDataTable(std::string_view text) {
   ReadTable table;
+  std::size_t number = 0;
   for (std::size_t end = text.find('\n'); end != std::string_view::npos; end = text.find('\n')) {
     std::string_view line = text.substr(0, end);
     text.remove_prefix(end + 1);
+    ++number;
     if (!line.empty() && line.back() == '\r') line.remove_suffix(1);
     if (line.empty()) continue;
     if (line.front() == '#') {
@@ -172,6 +175,10 @@ ReadTable readDataTable(std::string_view text) {
       table.rows.push_back(std::move(cells));
     } else {
       table.isDamaged = true;
+      if (table.oddLine == 0) {
+        table.oddLine = number;
+        table.oddCells = cells.size();
+      }
     }
   }
   if (!text.empty() || table.columns.empty()) table.isDamaged = true;
@@ -181,6 +188,21 @@ ReadTable readDataTable(std::string_view text) {
     if (count && static_cast<std::size_t>(*count) != table.rows.size()) table.isDamaged = true;
   }
   return table;
+}
+
+ReadTable readGivenTable(std::string_view text, const char* refusal, const std::string& fileName) {
+  std::string complete(text);
+  if (!complete.ends_with('\n')) complete += '\n';
+  ReadTable table = readDataTable(complete);
+  if (!table.isDamaged) return table;
+  if (table.oddLine > 0) {
+    fatalError(refusal, fmt::format("{}:{}: expected {} separated by tabs, as in the header row, found {}", fileName,
+                                    table.oddLine, countText(table.columns.size(), "cell"), table.oddCells));
+  }
+  if (table.columns.empty()) fatalError(refusal, fileName + ": expected a tab-separated table, found no header row");
+  fatalError(refusal, fmt::format("{}: expected as many rows as its head says, found {}: the file has not been written "
+                                  "or copied to its end",
+                                  fileName, table.rows.size()));
 }
 
 std::optional<double> realCell(std::string_view cell) {

@@ -61,10 +61,16 @@ struct ReadTable {
   std::vector<std::vector<std::string>> rows;  ///< complete rows only: a last line without a line end is left out
   /// The last line has no end, a row has too few or too many cells, or there are not as many rows as the head says.
   bool isDamaged = false;
+  std::size_t oddLine = 0;   ///< the first with another number of cells than the header row, from 1; 0: none
+  std::size_t oddCells = 0;  ///< in that line
 
   /// The 0-based index of a column; empty when there is none of that name.
   std::optional<std::size_t> column(std::string_view name) const;
 };
+
+/// Reads a table that somebody may have written or edited; its last line needs no line end. Throws FatalError with
+/// `refusal` where rows or the header are missing or have another number of cells, naming `fileName` and the line.
+ReadTable readGivenTable(std::string_view text, const char* refusal, const std::string& fileName);
 
 /// Reads the text of a table. Accepts any text; rows with a different number of cells from the header row are left out.
 ReadTable readDataTable(std::string_view text);

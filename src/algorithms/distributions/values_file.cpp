@@ -1,5 +1,6 @@
 #include "algorithms/distributions/values_file.h"
 
+#include <algorithm>
 #include <cmath>
 
 #include <fmt/format.h>
@@ -21,6 +22,9 @@ std::vector<double> columnOf(const ReadTable& table, std::string_view column, co
                                      quotedForMessage(column),
                                      nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
   }
+  if (std::ranges::count(table.columns, column) > 1) {
+    fatalError(kRefusal, fmt::format("{}: {} is the name of several columns", fileName, quotedForMessage(column)));
+  }
   std::vector<double> values;
   for (std::size_t row = 0; row < table.rows.size(); ++row) {
     const std::string& cell = table.rows[row][*index];
@@ -37,7 +41,7 @@ std::vector<double> columnOf(const ReadTable& table, std::string_view column, co
 }  // namespace
 
 std::vector<double> readValues(std::string_view text, std::string_view column, const std::string& fileName) {
-  if (!column.empty()) return columnOf(readDataTable(text), column, fileName);
+  if (!column.empty()) return columnOf(readGivenTable(text, kRefusal, fileName), column, fileName);
   constexpr std::string_view kBlanks = " \t";
   std::vector<double> values;
   std::size_t number = 0;

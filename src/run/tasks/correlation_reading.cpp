@@ -104,19 +104,30 @@ std::size_t parameterNamed(const std::string& name, std::string_view keyword, co
 /// FatalError.
 std::size_t takeTable(const ReadTable& table, const std::string& fileName, const SearchSpace& space, Matrix& matrix) {
   std::map<std::string, std::size_t> rowOf;
-  for (std::size_t row = 0; row < table.rows.size(); ++row) rowOf.emplace(table.rows[row].front(), row);
+  for (std::size_t row = 0; row < table.rows.size(); ++row) {
+    if (const auto& name = table.rows[row].front(); !rowOf.emplace(name, row).second) {
+      fatalError(kFileRefusal, fmt::format("{}: {} is the name of several rows", fileName, quotedForMessage(name)));
+    }
+  }
   std::vector<std::size_t> taken;
   std::vector<std::size_t> columns;
   for (std::size_t j = 0; j < space.size(); ++j) {
     const auto column = table.column(space.names[j]);
     if (!column || *column == 0 || !rowOf.contains(space.names[j])) continue;
+    if (std::ranges::count(table.columns, space.names[j]) > 1) {
+      fatalError(kFileRefusal,
+                 fmt::format("{}: {} is the name of several columns", fileName, quotedForMessage(space.names[j])));
+    }
     taken.push_back(j);
     columns.push_back(*column);
   }
-  if (taken.empty()) {
-    fatalError(kFileRefusal, fmt::format("{}: expected a tab-separated table with a row and a column for each of the "
-                                         "parameters, such as {}; found none of them",
-                                         fileName, quotedForMessage(space.names.front())));
+  if (taken.size() < std::min<std::size_t>(2, space.size())) {
+    fatalError(
+        kFileRefusal,
+        fmt::format("{}: expected a tab-separated table with a row and a column for each of the parameters, two "
+                    "or more of the variable ones, such as {}; found {}",
+                    fileName, quotedForMessage(space.names[taken.empty() ? 0 : (taken.front() + 1) % space.size()]),
+                    taken.empty() ? "none of them" : quotedForMessage(space.names[taken.front()]) + " alone"));
   }
   constexpr double kRounding = 1.0e-6;
   for (std::size_t a = 0; a < taken.size(); ++a) {
@@ -146,7 +157,7 @@ void takeFile(const SetupSection& section, const std::string& path, const Search
     std::string reason;
     const auto text = readTextFile(path, reason);
     if (!text) fatalError("Error: Unable to open " + path, reason);
-    const std::size_t count = takeTable(readDataTable(*text), path, space, matrix);
+    const std::size_t count = takeTable(readGivenTable(*text, kFileRefusal, path), path, space, matrix);
     section.note(kCorrelationFileKeyword,
                  fmt::format("correlations of {} of the {} variable parameters", count, space.size()));
   });

@@ -25,6 +25,11 @@ class DistributionReading : public SetupFixture {
     folder_.write("half.dat", "Parameter\tRate\tDepth\nRate\t1\t-0.6\nDepth\t0.6\t1\n");
     folder_.write("nan.dat", "Parameter\tRate\tDepth\nRate\t1\tNaN\nDepth\tNaN\t1\n");
     folder_.write("none.dat", "1\t0.5\n0.5\t1\n");
+    folder_.write("open.dat", "Parameter\tRate\tDepth\nRate\t1\t0.3\nDepth\t0.3\t1");
+    folder_.write("short.dat", "Parameter\tRate\tDepth\nRate\t1\t0.3\nDepth\t0.3\n");
+    folder_.write("alone.dat", "Parameter\tRate\nRate\t1\n");
+    folder_.write("twice.dat", "Parameter\tRate\tDepth\nRate\t1\t0.3\nRate\t1\t0.5\nDepth\t0.3\t1\n");
+    folder_.write("cut.dat", "x\ty\n1\t2\n3\n2\t4");
   }
 
   /// The setup of an uncertainty analysis with `keywords` in the section of the second parameter, Rate, which is
@@ -126,6 +131,9 @@ TEST_F(DistributionReading, RefusesWhatCannotBe) {
        "bad.dat:2: expected a number, found \"abc\""},
       {"Distribution = 'values'\nValues_File = 'table.dat'\nValues_Column = 'Rat'" + model,
        "Values of the distribution invalid", "did you mean \"Rate\"?"},
+      {"Distribution = 'values'\nValues_File = 'cut.dat'\nValues_Column = 'x'" + model,
+       "Values of the distribution invalid",
+       "cut.dat:3: expected 2 cells separated by tabs, as in the header row, found 1"},
       {"Distribution = 'values'\nValues_File = 'same.dat'" + model, "Values of the distribution invalid",
        "too many of the values are equal"}};
   for (const auto& [keywords, message, detail] : cases) {
@@ -145,6 +153,7 @@ TEST_F(DistributionReading, CorrelationsComeFromAFileAndFromPairs) {
   };
   EXPECT_EQ(correlation(pair("Depth", "rate", "0.25")), 0.25);
   EXPECT_EQ(correlation("Correlation_File = 'cor.dat'"), -0.6);
+  EXPECT_EQ(correlation("Correlation_File = 'open.dat'"), 0.3) << "a last line without an end";
   EXPECT_EQ(correlation("Correlation_File = 'cor.dat'\n" + pair("Rate", "Depth", "0.1")), 0.1);
   EXPECT_EQ(correlation(pair("Rate", "Depth", "0")), 0.0);
   EXPECT_DOUBLE_EQ(correlation("Correlation_Type = 'rank'\n" + pair("Rate", "Depth", "0.5")), 2 * std::sin(M_PI / 12));
@@ -165,6 +174,9 @@ TEST_F(DistributionReading, CorrelationsComeFromAFileAndFromPairs) {
        "Correlation of parameters given twice", " have 0.5 at setup.kdx:"},
       {"Correlation_File = 'absent.dat'", "Unable to open absent.dat", ""},
       {"Correlation_File = 'none.dat'", "Correlation file invalid", "such as \"Depth\"; found none of them"},
+      {"Correlation_File = 'short.dat'", "Correlation file invalid", "short.dat:3: expected 3 cells separated by tabs"},
+      {"Correlation_File = 'alone.dat'", "Correlation file invalid", "such as \"Depth\"; found \"Rate\" alone"},
+      {"Correlation_File = 'twice.dat'", "Correlation file invalid", "\"Rate\" is the name of several rows"},
       {"Correlation_File = 'half.dat'", "Correlation file invalid",
        "Rate and Depth: expected 0.6, as in the other half of the table, found -0.6"},
       {"Correlation_File = 'nan.dat'", "Correlation file invalid",
