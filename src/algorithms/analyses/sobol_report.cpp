@@ -166,10 +166,16 @@ void appendFixable(const SobolFindings& findings, const SobolOutput& output, std
                     100.0 * (1.0 - std::pow(kTail, 1.0 / static_cast<double>(fewest))), fewest));
   }
   const auto open = factorsWhere(
-      indices, [&](std::size_t j) { return !(indices.total[j].upper < limit) && !(indices.total[j].lower >= limit); });
+      indices, [&](std::size_t j) { return indices.total[j].upper >= limit && indices.total[j].lower < limit; });
   if (!open.empty()) {
     lines.push_back(fmt::format("   Undecided, as the limits of the total index include {:g}: {}", limit,
                                 namesWithLimits(names, indices.total, open)));
+  }
+  const auto unknown = factorsWhere(indices, [&](std::size_t j) { return std::isnan(indices.total[j].upper); });
+  if (!unknown.empty()) {
+    ShortList list(kMostNames);
+    for (const std::size_t j : unknown) list.add(names[j]);
+    lines.push_back(fmt::format("   Not known, as too few blocks have results for limits: {}", list.text()));
   }
 }
 

@@ -40,7 +40,7 @@ std::string headOf(std::string_view title, std::span<const SobolFactor> factors)
 SobolSeries sobolSeries(std::string_view title, const ObservedSeries& observed, const SobolDesign& design,
                         std::span<const SobolFactor> factors, std::span<const std::size_t> sets,
                         const ReadColumns& read, const ReplicateBootstrap& bootstrap) {
-  SobolSeries series{headOf(title, factors), 0, std::vector<std::size_t>(factors.size(), 0)};
+  SobolSeries series{headOf(title, factors), 0, std::vector<std::size_t>(factors.size(), 0), 0};
   const std::size_t atOnce = std::max<std::size_t>(1, kValuesAtOnce / std::max<std::size_t>(sets.size(), 1));
   const std::size_t times = observed.days.size();
   const std::int64_t origin = secondNumber(observed.start);
@@ -52,14 +52,12 @@ SobolSeries sobolSeries(std::string_view title, const ObservedSeries& observed, 
     for (std::size_t i = 0; i < sets.size(); ++i) values[sets[i]] = ofTime[i];
     const SobolIndices indices = sobolIndices(design, values, bootstrap, kSeriesBootstrapSamples, false);
     std::size_t blocks = design.rows;
-    std::size_t largest = 0;
-    for (std::size_t j = 0; j < factors.size(); ++j) {
-      blocks = std::min(blocks, indices.first[j].blocks);
-      if (indices.total[j].value > indices.total[largest].value) largest = j;
-    }
-    if (!std::isnan(indices.total[largest].value)) {
+    for (const SobolIndex& index : indices.first) blocks = std::min(blocks, index.blocks);
+    if (indices.isConstant && indices.valueCount > 1) ++series.constantCount;
+    if (std::ranges::all_of(indices.total, [](const SobolIndex& index) { return !std::isnan(index.lower); })) {
+      const auto largest = std::ranges::max_element(indices.total, {}, &SobolIndex::value);
       ++series.timeCount;
-      ++series.largestCounts[largest];
+      ++series.largestCounts[static_cast<std::size_t>(largest - indices.total.begin())];
     }
     series.text += fmt::format("{},{},{},{},{}", formatDate(dateOfSecond(secondAfter(origin, observed.days[t]))),
                                std::isnan(observed.values[t]) ? "" : cell(observed.values[t]), cell(indices.mean),

@@ -18,8 +18,9 @@ struct SobolSeries {
   /// A time-series file: the columns time, observed, mean, standard deviation, blocks, and for every factor its
   /// first-order and total index with their limits.
   std::string text;
-  std::size_t timeCount = 0;               ///< times at which the simulated values vary
-  std::vector<std::size_t> largestCounts;  ///< one per factor: the times at which its total index is the largest
+  std::size_t timeCount = 0;               ///< times at which the total indices of all factors have limits
+  std::vector<std::size_t> largestCounts;  ///< one per factor: those of them at which its total index is the largest
+  std::size_t constantCount = 0;           ///< times at which all runs have the same value
 };
 
 /// The columns of a series file behind the time and before those of the factors, and how many each factor has.

@@ -104,7 +104,17 @@ std::string leadersText(const SobolSeries& series, std::span<const SobolFactor> 
         "{}{} at {:.0f} %", i == 0 ? "" : ", ", factors[order[i]].name,
         100.0 * static_cast<double>(series.largestCounts[order[i]]) / static_cast<double>(series.timeCount));
   }
-  return text + fmt::format(" of {} times", series.timeCount);
+  return text + fmt::format(" of {}", countText(series.timeCount, "time"));
+}
+
+/// Whose total index is the largest, or why that is not known.
+std::string seriesText(const std::string& name, const SobolSeries& series, std::span<const SobolFactor> factors) {
+  if (series.timeCount > 0) {
+    return fmt::format("   Series of {}, largest total index: {}", name, leadersText(series, factors));
+  }
+  return fmt::format("   Series of {}: {}", name,
+                     series.constantCount > 0 ? "no parameter has an influence"
+                                              : "which total index is the largest is not known, as none has limits");
 }
 
 }  // namespace
@@ -268,9 +278,7 @@ TaskOutcome SobolTask::outcomeOf(const TaskContext& context, std::span<const Eva
     outcome.files.push_back(
         {runFilePath(context.filePrefix, run_files::kSobolSeries, static_cast<int>(observed.measure) + 1),
          series.text});
-    outcome.report.push_back(series.timeCount == 0 ? fmt::format("   Series of {}: no parameter has an influence", name)
-                                                   : fmt::format("   Series of {}, largest total index: {}", name,
-                                                                 leadersText(series, factors_)));
+    outcome.report.push_back(seriesText(name, series, factors_));
     outcome.report.push_back("   " + outcome.files.back().path);
   }
   return outcome;

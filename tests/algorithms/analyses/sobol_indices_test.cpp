@@ -257,6 +257,8 @@ TEST(SobolReport, TheTableSaysWhyAnIndexOrItsLimitsAreMissing) {
   run.values = whole;
   for (std::size_t row = 0; row < 64; ++row) run.values[run.design.ofAWithB(row, 2)] = std::nan("");
   EXPECT_EQ(textsOf(run).problem, "no block of the design has all runs that the index needs");
+  EXPECT_THAT(textsOf(run).log, ::testing::HasSubstr("Not known, as too few blocks have results for limits: x3\n"));
+  EXPECT_THAT(textsOf(run).log, ::testing::Not(::testing::HasSubstr("Undecided")));
   run.values.assign(whole.size(), 3.0);
   EXPECT_EQ(textsOf(run).problem, "no parameter has an influence, all runs have the same value");
   run.values.assign(whole.size(), std::nan(""));
