@@ -86,7 +86,11 @@ SearchStatus CmaEs::initialise() {
     if (surrogate_) surrogate_->note(problem_.selector->scaled(sample[i]), value);
     if (isBetter(results[i].aggregate, results[best].aggregate)) best = i;
   }
-  startRun(restarts_.first(), best < given ? relative(summary_.best) : centreOf(sample, results));
+  if (budgetLeft() <= 0) {
+    summary_.terminationMessage = kBudgetUsedMessage;
+  } else {
+    startRun(restarts_.first(), best < given ? relative(summary_.best) : centreOf(sample, results));
+  }
   return kSearchOk;
 }
 
@@ -122,15 +126,15 @@ void CmaEs::startRun(const CmaRun& run, std::vector<double> mean) {
   change.loopsConvergence =
       std::max(change.loopsConvergence,
                static_cast<std::int32_t>(CmaTests::shortHistory(problem_.bounds.size(), run.population)));
-  change_.emplace(change);
+  change_.emplace(change, StoppingTests::Divisor::sizes);
   bestOfRun_ = std::numeric_limits<double>::quiet_NaN();
   startedAt_ = summary_.evaluationCount;
   ++runCount_;
 }
 
 SearchStatus CmaEs::advance() {
-  if (!distribution_) return kSearchNotInitialised;
   if (isTerminated()) return kSearchOk;
+  if (!distribution_) return kSearchNotInitialised;
   std::vector<Point> points = drawGeneration();
   const bool hasModel = surrogate_ && surrogate_->isActive(summary_.loopCount) && surrogate_->fit(*distribution_);
   std::vector<std::size_t> all(points.size());

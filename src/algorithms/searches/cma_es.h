@@ -48,6 +48,8 @@ class CmaEs final : public SearchAlgorithm {
   SearchStatus advance() override;
   bool isTerminated() const override { return !summary_.terminationMessage.empty(); }
   const SearchSummary& summary() const override { return summary_; }
+  /// It does, but by their sizes.
+  bool comparesBestValues() const override { return false; }
 
  private:
   struct Point {

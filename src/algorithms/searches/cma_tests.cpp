@@ -8,7 +8,7 @@ namespace mirevo {
 namespace {
 
 constexpr double kLeastStep = 1.0e-12;        ///< TolX, in units of the first step
-constexpr double kLeastDifference = 1.0e-12;  ///< TolFun, in units of the differences in the initial sample
+constexpr double kLeastDifference = 1.0e-12;  ///< TolFun, in units of the least value
 constexpr double kLargestGrowth = 1.0e4;      ///< TolXUp, of the longest axis
 constexpr double kWorstCondition = 1.0e14;    ///< ConditionCov
 constexpr int kShortestStagnation = 120;      ///< generations

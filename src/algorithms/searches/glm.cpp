@@ -126,7 +126,15 @@ std::vector<std::optional<Glm::Point>> Glm::run(std::span<const ParameterSet> se
     for (std::size_t k = 0; k < units_.size(); ++k) units_[k] = std::min(units_[k], rows.units[k]);
     const double squares = sumOfSquares(rows.values);
     const double sum = squares + priorSum(sets[i]);
-    if (!std::isfinite(sum)) continue;
+    if (!std::isfinite(sum)) {
+      if (firstFailure_.empty()) {
+        firstFailure_ = fmt::format(
+            "evaluation {} succeeded, but its sum of squares, with that of the prior values, is "
+            "beyond the range of numbers",
+            results[i].number);
+      }
+      continue;
+    }
     point = Point{sets[i], std::move(results[i]), std::move(rows), squares, sum};
   }
   return points;
@@ -150,7 +158,13 @@ SearchStatus Glm::initialise() {
     starts_.push_back(*std::move(point));
   }
   std::stable_sort(starts_.begin(), starts_.end(), [](const Point& a, const Point& b) { return a.sum < b.sum; });
-  starts_.resize(std::min(starts_.size(), static_cast<std::size_t>(settings_.startCount)));
+  const auto wanted = std::min(sample.size(), static_cast<std::size_t>(settings_.startCount));
+  if (!starts_.empty() && starts_.size() < wanted) {
+    note(fmt::format("GLM has {} in place of {}: the other runs of the initial sample failed",
+                     countText(starts_.size(), "start"), wanted));
+  }
+  starts_.resize(std::min(starts_.size(), wanted));
+  startCount_ = starts_.size();
   if (starts_.empty()) {
     summary_.failure = "No model run of the initial sample of GLM succeeded";
     summary_.failureDetail = fmt::format("{} made, none of which has residuals to start from; the first of them, {}",
@@ -198,6 +212,14 @@ void Glm::noteBest(const Point& point) {
 
 void Glm::end(std::string message) {
   const SearchBounds& b = problem_.bounds;
+  if (message == kBudgetUsedMessage && runCount_ > 0) {
+    note(fmt::format("Run {} of GLM was going on when the budget was used up: sum of squares {}", runCount_,
+                     formatReal(current_->sum)));
+  }
+  if (!starts_.empty()) {
+    note(fmt::format("Warning: The budget left none for {} of {} of GLM", starts_.size(),
+                     countText(startCount_, "start")));
+  }
   for (std::size_t j = 0; best_ && j < b.size(); ++j) {
     const bool isAtLower = best_->set[j] <= b.lower[j];
     if (!isAtLower && !(best_->set[j] >= b.upper[j])) continue;
@@ -435,6 +457,12 @@ SearchStatus Glm::advance() {
   }
   stoppedBy_.clear();
   GlmLinearModel model = linearModel();
+  const bool isInert = std::ranges::all_of(jacobian_, [](const auto& column) { return sumOfSquares(column) == 0.0; });
+  if (isInert && current_->squares > 0.0 && settings_.regularisation == 0.0 &&
+      std::ranges::all_of(differences_->problems, &std::string::empty)) {
+    refineOr("no residual changes with any parameter");
+    return kSearchOk;
+  }
   if (model.largestCosine(constraints_.holding(current_->set)) < settings_.minGradient) {
     const bool isWhole = std::ranges::all_of(differences_->problems, &std::string::empty);
     refineOr(isWhole ? "the gradient is negligible" : "the gradient is negligible where it is known");
@@ -604,8 +632,10 @@ void Glm::judge(double reduction, double step, bool isAsExpected, bool isStopped
   needsJacobian_ = updates_ > settings_.broydenUpdates || !isAsExpected;
   if (step < settings_.minStep || smallChanges_ >= kSmallChanges) {
     if (isFresh) updates_ = 0;  // this step's derivatives were made for it
+    const int smallChanges = smallChanges_;
     refineOr(step < settings_.minStep ? "its steps are less than Min_Step"
                                       : "the sum of squares changes by less than Min_Change");
+    if (!isFresh && smallChanges > 0) smallChanges_ = kSmallChanges - 1;  // the next step, with its own, decides
     return;
   }
   if (settings_.differences == GlmDifferences::automatic && !isCentral_ && reduction < kNearOptimum) {

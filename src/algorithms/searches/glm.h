@@ -59,6 +59,8 @@ class Glm final : public SearchAlgorithm {
   SearchStatus advance() override;
   bool isTerminated() const override { return !summary_.terminationMessage.empty(); }
   const SearchSummary& summary() const override { return summary_; }
+  /// It compares sums of squares.
+  bool comparesBestValues() const override { return false; }
 
  private:
   struct Point {
@@ -111,6 +113,7 @@ class Glm final : public SearchAlgorithm {
   GlmConstraints constraints_;
   SearchSummary summary_;
   std::deque<Point> starts_;  ///< not used yet, the best first
+  std::size_t startCount_ = 0;
   std::optional<Point> best_;
   std::string firstFailure_;                                      ///< of a run of the initial sample, one line
   double leastOfRuns_ = std::numeric_limits<double>::infinity();  ///< the least sum to which a run has come

@@ -64,6 +64,7 @@ SearchStatus NsgaIi::initialise() {
   const std::size_t given = givenSetCount(problem_.initialSample, problem_.givenSample.size(), count);
   feasible_.replaceInSample(sample, given, problem_.bounds, problem_.random);
   selectPopulation(runSample(sample));
+  if (budgetLeft() <= 0) checkEnd();
   return kSearchOk;
 }
 

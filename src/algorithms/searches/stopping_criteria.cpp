@@ -42,8 +42,8 @@ const SettingSection<StoppingCriteria>& stoppingSection() {
   return section;
 }
 
-StoppingTests::StoppingTests(const StoppingCriteria& criteria)
-    : criteria_(criteria), relativeChange_(criteria.minChange + criteria.minChange) {}
+StoppingTests::StoppingTests(const StoppingCriteria& criteria, Divisor divisor)
+    : criteria_(criteria), divisor_(divisor), relativeChange_(criteria.minChange + criteria.minChange) {}
 
 void StoppingTests::update(double bestValue, int evaluationCount, double populationRange) {
   const auto length = static_cast<std::size_t>(std::max(1, criteria_.loopsConvergence));
@@ -51,9 +51,10 @@ void StoppingTests::update(double bestValue, int evaluationCount, double populat
   if (history_.size() > length) history_.pop_back();
   if (history_.size() == length) {
     const double earlier = history_.back();
-    // Deliberately without an absolute value in the denominator: negative values give a negative change, with which the
+    // Divisor::values is deliberately without an absolute value: negative values give a negative change, with which the
     // search counts as converged.
-    relativeChange_ = 2.0 * std::abs(earlier - bestValue) / (bestValue + earlier);
+    const double sum = divisor_ == Divisor::values ? bestValue + earlier : std::abs(bestValue) + std::abs(earlier);
+    relativeChange_ = 2.0 * std::abs(earlier - bestValue) / sum;
   }
 
   populationRange_ = populationRange;

@@ -37,7 +37,10 @@ const SettingSection<StoppingCriteria>& stoppingSection();
 /// message.
 class StoppingTests final {
  public:
-  explicit StoppingTests(const StoppingCriteria& criteria);
+  /// What the change of the best value is divided by: the mean of the two values, which makes that of negative ones
+  /// negative, so that they count as converged, or the mean of their sizes.
+  enum class Divisor { values, sizes };
+  explicit StoppingTests(const StoppingCriteria& criteria, Divisor divisor = Divisor::values);
 
   /// Makes the tests after a loop. `bestValue` is the population's best objective value; `populationRange` comes from
   /// normalisedPopulationRange().
@@ -48,8 +51,9 @@ class StoppingTests final {
   std::string_view message() const { return message_; }
   /// Of the tests of the change and of the range those that are met, one line each with the value and its limit.
   std::vector<std::string> reasons() const;
-  /// 2·|H − f| / (f + H), where f is the best value and H the best value `loopsConvergence` − 1 loops earlier. Until
-  /// there is such a loop it is twice `minChange`, so that the search cannot count as converged.
+  /// 2·|H − f| / (f + H), with Divisor::sizes 2·|H − f| / (|f| + |H|), where f is the best value and H the best value
+  /// `loopsConvergence` − 1 loops earlier. Until there is such a loop it is twice `minChange`, so that the search
+  /// cannot count as converged.
   double relativeChange() const { return relativeChange_; }
 
  private:
@@ -57,6 +61,7 @@ class StoppingTests final {
   bool isRangeSmall() const { return criteria_.minPopulationRange > populationRange_; }
 
   StoppingCriteria criteria_;
+  Divisor divisor_;
   std::deque<double> history_;  ///< best value of each of the last `loopsConvergence` loops, newest first
   double relativeChange_;
   double populationRange_ = std::numeric_limits<double>::infinity();

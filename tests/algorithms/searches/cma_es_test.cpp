@@ -160,6 +160,7 @@ TEST(CmaEs, MakesEveryGenerationOneBatchWithinTheBudget) {
     EXPECT_EQ(trial.summary.evaluationCount, budget);
     EXPECT_EQ(trial.summary.terminationMessage, "Optimisation terminated: Maximum number of model evaluations reached");
     for (std::size_t i = 0; i + 1 < trial.batches.size(); ++i) EXPECT_EQ(trial.batches[i].size(), 8U);
+    EXPECT_EQ(trial.summary.notes.size(), budget > 8 ? 1U : 0U) << "no run without an evaluation";
   }
 }
 
@@ -289,6 +290,12 @@ TEST(CmaEs, SaysWhyItsRunsEndAndEndsWithTheLastOne) {
   EXPECT_THAT(several.notes, ::testing::Contains(::testing::HasSubstr(": 12 points in a generation")));
   const SearchSummary change = lines({.settings = {.doublings = 0}, .budget = 20000, .minChange = 0.5});
   EXPECT_THAT(change.terminationMessage, ::testing::HasSubstr("Min_Change"));
+  // Whatever the values' sign.
+  const auto below = [](const std::vector<double>& x) { return testing::rastrigin(x) - 1.0e6; };
+  const CmaConditions untilChange{.settings = {.doublings = 0}, .budget = 20000, .minChange = 1e-12};
+  const SearchSummary negative = cmaSearch(cmaCube(2, -5.12, 5.12), plainly(below), untilChange).summary;
+  const SearchSummary early = cmaSearch(cmaCube(2, -5.12, 5.12), plainly(testing::rastrigin), untilChange).summary;
+  EXPECT_GT(negative.evaluationCount, early.evaluationCount / 2);
   const SearchSummary flat = cmaSearch(cmaCube(2, 0.0, 1.0), plainly([](const auto&) { return 3.0; }),
                                        {.settings = {.doublings = 0}, .budget = 20000})
                                  .summary;

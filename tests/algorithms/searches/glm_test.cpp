@@ -248,6 +248,31 @@ TEST(Glm, SeveralStartsFindTheBetterValley) {
   EXPECT_THAT(notesOf(trial), HasSubstr("Run 2 of GLM starts from evaluation "));
 }
 
+TEST(Glm, SaysWhyItEndsAndWhichStartsTheBudgetLeftOut) {
+  // Decays with errors that do not vanish: gains get smaller and smaller, with derivatives of its own as after Broyden.
+  const auto decay = [](const ParameterSet& b) {
+    std::vector<double> residuals;
+    for (int t = 0; t < 12; ++t) {
+      residuals.push_back(b[0] * std::exp(-b[1] * t) + b[2] - (5.0 * std::exp(-0.3 * t) + 1.0 + std::sin(7.0 * t)));
+    }
+    return residuals;
+  };
+  const SearchBounds bounds{{0, 0, -5}, {20, 2, 5}, {15, 1.5, -3}};
+  GlmConditions c;
+  c.minChange = 1e-3;
+  EXPECT_THAT(notesOf(glmSearch(bounds, decay, c)), HasSubstr("changes by less than Min_Change"));
+  c.settings.sampleSize = 10;
+  c.settings.startCount = 5;
+  c.budget = 25;
+  const std::string cut = notesOf(glmSearch(bounds, decay, c));
+  EXPECT_THAT(cut, HasSubstr("Run 1 of GLM was going on when the budget was used up: sum of squares "));
+  EXPECT_THAT(cut, HasSubstr("Warning: The budget left none for 4 of 5 starts of GLM\n"));
+  c.fails = [](int number, const ParameterSet&) { return number > 2 && number <= 10; };
+  EXPECT_THAT(notesOf(glmSearch(bounds, decay, c)), HasSubstr("GLM has 2 starts in place of 5"));
+  const auto inert = [](const ParameterSet&) { return std::vector<double>{1.0, 2.0}; };
+  EXPECT_THAT(notesOf(glmSearch(bounds, inert, {})), HasSubstr("ended as no residual changes with any parameter"));
+}
+
 /// Estimates of least squares under constraints in closed form.
 TEST(Glm, GoesAlongConstraintsToTheMinimumThatTheyLeave) {
   using Set = ParameterSet;
