@@ -2,7 +2,7 @@
 // interrupted run leaves. Wanted each time: nothing lost that was reported as done, a message that names the file and
 // the system's reason, no process left, and a setup that can be run again.
 //
-//   faults                       a fault a kind of file and call, for every build (some seconds)
+//   faults                       a fault a kind of file and call, for every build (two minutes)
 //   faults --long                every call and error, hundreds of interruptions (many minutes)
 //   faults [--long] GROUP ...    only these: injected, interruptions, ranks, real
 

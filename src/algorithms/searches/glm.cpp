@@ -109,17 +109,17 @@ std::vector<std::optional<Glm::Point>> Glm::run(std::span<const ParameterSet> se
       summary_.best = sets[i];
       summary_.bestResult = results[i];
     }
+    const auto noteFailure = [this](std::string text) {
+      if (firstFailure_.empty()) firstFailure_ = std::move(text);
+    };
     if (!results[i].ok()) {
-      if (firstFailure_.empty()) firstFailure_ = failureText(results[i]);
+      noteFailure(failureText(results[i]));
       continue;
     }
     ResidualRows rows = problem_.residuals->residualsOf(results[i]);
     results[i].simulatedValues = {};
     if (!std::ranges::all_of(rows.values, [](double value) { return std::isfinite(value); })) {
-      if (firstFailure_.empty()) {
-        firstFailure_ =
-            fmt::format("evaluation {} succeeded, but not all of its residuals are known", results[i].number);
-      }
+      noteFailure(fmt::format("evaluation {} succeeded, but not all of its residuals are known", results[i].number));
       continue;
     }
     units_.resize(rows.units.size(), std::numeric_limits<double>::infinity());
@@ -127,12 +127,10 @@ std::vector<std::optional<Glm::Point>> Glm::run(std::span<const ParameterSet> se
     const double squares = sumOfSquares(rows.values);
     const double sum = squares + priorSum(sets[i]);
     if (!std::isfinite(sum)) {
-      if (firstFailure_.empty()) {
-        firstFailure_ = fmt::format(
-            "evaluation {} succeeded, but its sum of squares, with that of the prior values, is "
-            "beyond the range of numbers",
-            results[i].number);
-      }
+      noteFailure(
+          fmt::format("evaluation {} succeeded, but its sum of squares, with that of the prior values, is beyond the "
+                      "range of numbers",
+                      results[i].number));
       continue;
     }
     point = Point{sets[i], std::move(results[i]), std::move(rows), squares, sum};
@@ -457,14 +455,13 @@ SearchStatus Glm::advance() {
   }
   stoppedBy_.clear();
   GlmLinearModel model = linearModel();
+  const bool isWhole = std::ranges::all_of(differences_->problems, &std::string::empty);
   const bool isInert = std::ranges::all_of(jacobian_, [](const auto& column) { return sumOfSquares(column) == 0.0; });
-  if (isInert && current_->squares > 0.0 && settings_.regularisation == 0.0 &&
-      std::ranges::all_of(differences_->problems, &std::string::empty)) {
+  if (isInert && current_->squares > 0.0 && settings_.regularisation == 0.0 && isWhole) {
     refineOr("no residual changes with any parameter");
     return kSearchOk;
   }
   if (model.largestCosine(constraints_.holding(current_->set)) < settings_.minGradient) {
-    const bool isWhole = std::ranges::all_of(differences_->problems, &std::string::empty);
     refineOr(isWhole ? "the gradient is negligible" : "the gradient is negligible where it is known");
     return kSearchOk;
   }
@@ -635,7 +632,7 @@ void Glm::judge(double reduction, double step, bool isAsExpected, bool isStopped
     const int smallChanges = smallChanges_;
     refineOr(step < settings_.minStep ? "its steps are less than Min_Step"
                                       : "the sum of squares changes by less than Min_Change");
-    if (!isFresh && smallChanges > 0) smallChanges_ = kSmallChanges - 1;  // the next step, with its own, decides
+    if (!isFresh) smallChanges_ = std::min(smallChanges, kSmallChanges - 1);  // the next step, with its own, decides
     return;
   }
   if (settings_.differences == GlmDifferences::automatic && !isCentral_ && reduction < kNearOptimum) {

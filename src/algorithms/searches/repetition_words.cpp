@@ -10,6 +10,7 @@
 
 #include "algorithms/numbers/sample_summary.h"
 #include "common/rounded_text.h"
+#include "common/short_list.h"
 #include "common/take_text.h"
 #include "common/text.h"
 
@@ -234,17 +235,14 @@ std::string sameSearchesText(std::span<const Repetition> repetitions) {
 
 std::string withoutBestText(std::span<const Repetition> repetitions) {
   const auto isWithout = [](const Repetition& one) { return !one.termination.empty() && one.bestEvaluation == 0; };
-  std::vector<std::size_t> numbers;
+  ShortList numbers(kMostNamed);
   for (std::size_t i = 0; i < repetitions.size(); ++i) {
-    if (isWithout(repetitions[i])) numbers.push_back(i + 1);
+    if (isWithout(repetitions[i])) numbers.add(std::to_string(i + 1));
   }
-  if (numbers.empty()) return {};
-  std::string named =
-      fmt::format("{}", fmt::join(std::span(numbers).first(std::min(numbers.size(), kMostNamed)), ", "));
-  if (numbers.size() > kMostNamed) named += fmt::format(" and {} more", numbers.size() - kMostNamed);
+  if (numbers.isEmpty()) return {};
   return fmt::format(
       "{} of {} repetitions ended without a successful run and {} left out of what is said of all: No. {}",
-      numbers.size(), repetitions.size(), numbers.size() == 1 ? "is" : "are", named);
+      numbers.count(), repetitions.size(), numbers.count() == 1 ? "is" : "are", numbers.text());
 }
 
 std::vector<std::string> repetitionLines(std::span<const Repetition> repetitions, const SearchSpace& space,
