@@ -112,17 +112,17 @@ std::optional<ChainStates> readStates(std::string_view text) {
     for (std::size_t k = 0; k < row.size(); ++k) row[k] = realCell(cells[k]).value_or(kNaN);
     // Chain after chain, generation after generation.
     if (row[kGeneration] == 1.0) states.chainCount = rows + 1;
-    const std::size_t generation = states.chainCount == 0 ? 0 : rows / states.chainCount;
-    const std::size_t chain = states.chainCount == 0 ? 0 : rows % states.chainCount;
-    const bool isNext = states.chainCount > 0 && row[kChain] == static_cast<double>(chain + 1) &&
-                        row[kGeneration] == static_cast<double>(generation + 1);
-    states.isCutOff = !isNext;
-    if (!isNext) break;
+    states.isCutOff = states.chainCount == 0;
+    if (states.isCutOff) break;
+    const std::size_t generation = rows / states.chainCount + 1;
+    const std::size_t chain = rows % states.chainCount + 1;
+    states.isCutOff = row[kChain] != static_cast<double>(chain) || row[kGeneration] != static_cast<double>(generation);
+    if (states.isCutOff) break;
     for (std::size_t k = 0; k < row.size(); ++k) states.columns[k].push_back(row[k]);
     ++rows;
     at = end + 1;
   }
-  if (rows == 0) return std::nullopt;
+  if (rows == 0 || states.chainCount == 0) return std::nullopt;
   states.generationCount = rows / states.chainCount;
   states.isCutOff = states.isCutOff || rows % states.chainCount != 0;
   return states;

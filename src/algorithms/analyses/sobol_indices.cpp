@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 #include <numeric>
 
 #include <boost/math/distributions/students_t.hpp>
@@ -10,8 +11,6 @@
 
 namespace mirevo {
 namespace {
-
-constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 
 /// The sums of which the indices are made, as one row of numbers, so that those of several replicates can be added: the
 /// values of A and B, then a sum and its number of terms for each index.
