@@ -244,7 +244,7 @@ void EvaluationLedger::noteUnkeptFiles(std::size_t place, const EvaluationResult
 void EvaluationLedger::finishRepeated(std::size_t place, EvaluationResult known, EvaluationResult result) {
   known.shownSeries = std::move(result.shownSeries);
   if (result.ok()) known.pairs = std::move(result.pairs);
-  if (!result.ok() && known.ok()) {
+  if (!result.ok() && (known.ok() || isFinalRun_)) {
     observer_.warning(
         fmt::format("{} was made again{}: the model run failed: {}", progress::nameOfEvaluation(result.number),
                     isFinalRun_ ? "" : " for its pairs, and further runs are compared with the next successful one",
@@ -255,6 +255,12 @@ void EvaluationLedger::finishRepeated(std::size_t place, EvaluationResult known,
         fmt::format("{}, the final model run, was made again and has other results than in its row, "
                     "which is kept: the model depends on more than its parameters",
                     progress::nameOfEvaluation(result.number)));
+  }
+  if (isFinalRun_ && result.ok() && !known.ok()) {
+    observer_.warning(fmt::format(
+        "{}, the final model run, was made again and has succeeded. Its row, which is kept, has it as failed; "
+        "its process folder has the results",
+        progress::nameOfEvaluation(result.number)));
   }
   replay(place, std::move(known));
 }

@@ -20,9 +20,9 @@ namespace {
 
 /// Columns of the table before those of the parameters, behind which the last one stands. The ones from kOptional on
 /// are there as the search and the version have them.
-constexpr std::string_view kColumns[] = {"Repetition",      "Seed",        "Evaluations",
-                                         "Best_Evaluation", "Aggregate",   "Loops",
-                                         "Start_Aggregate", "Hypervolume", "Same_As"};
+constexpr std::string_view kColumns[] = {
+    "Repetition",      "Seed",        "Evaluations",    "Best_Evaluation",      "Aggregate", "Loops",
+    "Start_Aggregate", "Hypervolume", "Sum_of_Squares", "Start_Sum_of_Squares", "Same_As"};
 constexpr std::size_t kOptional = 6;
 constexpr std::string_view kLastColumn = "Termination";
 
@@ -80,7 +80,9 @@ std::optional<ReportedRepetition> readRepetition(const std::vector<std::string>&
                          cells.back(),
                          realIn(6),
                          realIn(7),
-                         places.columns[8] ? wholeIn(8).value_or(0) : 0};
+                         realIn(8),
+                         realIn(9),
+                         places.columns[10] ? wholeIn(10).value_or(0) : 0};
   for (std::size_t i = places.firstParameter; i + 1 < cells.size(); ++i) one.parameters.push_back(numberIn(cells[i]));
   return one;
 }
@@ -116,7 +118,7 @@ bool isCompared(const ReportedRepetition& one) {
 }
 
 std::string_view nameOf(FrontAgreement::Verdict verdict) {
-  static constexpr std::string_view kNames[] = {"none", "differ", "agree", "one set"};
+  static constexpr std::string_view kNames[] = {"none", "differ", "agree", "one set", "no search"};
   return kNames[static_cast<std::size_t>(verdict)];
 }
 
@@ -126,8 +128,9 @@ NearlyEqual nearlyEqualOf(const std::vector<ReportedRepetition>& all) {
   std::vector<double> starts;
   for (const ReportedRepetition& one : all) {
     if (!isCompared(one)) continue;
-    if (one.aggregate < least) least = one.aggregate;
-    starts.push_back(one.start);
+    const bool isOfSums = std::isfinite(one.sumOfSquares);
+    least = std::fmin(least, isOfSums ? one.sumOfSquares : one.aggregate);
+    starts.push_back(isOfSums ? one.startSum : one.start);
   }
   return std::isfinite(least) ? nearlyEqual(least, starts) : NearlyEqual{};
 }
@@ -166,8 +169,11 @@ std::optional<ReportedRepetitions> reportedRepetitions(const std::string& filePr
 
 void compareFronts(ReportedRepetitions& repetitions, const std::optional<ReportedFront>& front) {
   std::vector<double> hypervolumes;
+  std::int64_t loops = 0;
   for (const ReportedRepetition& one : repetitions.all) {
-    if (isCompared(one) && std::isfinite(one.hypervolume)) hypervolumes.push_back(one.hypervolume);
+    if (!isCompared(one) || !std::isfinite(one.hypervolume)) continue;
+    hypervolumes.push_back(one.hypervolume);
+    loops += one.loops;
   }
   if (hypervolumes.empty()) return;
   repetitions.hypervolumeOfAll = *std::ranges::max_element(hypervolumes);
@@ -177,7 +183,7 @@ void compareFronts(ReportedRepetitions& repetitions, const std::optional<Reporte
     }
   }
   const auto size = front ? static_cast<std::size_t>(std::ranges::count(front->ranks, 1)) : 0;
-  repetitions.agreement = frontAgreement(hypervolumes, repetitions.hypervolumeOfAll, size);
+  repetitions.agreement = frontAgreement(hypervolumes, repetitions.hypervolumeOfAll, size, loops);
 }
 
 void writeRepetitions(JsonWriter& json, const ReportedRepetitions& repetitions) {
@@ -188,6 +194,7 @@ void writeRepetitions(JsonWriter& json, const ReportedRepetitions& repetitions) 
     json.member("start", one.start);
     if (one.sameAs != 0) json.member("sameAs", one.sameAs);
     if (std::isfinite(one.hypervolume)) json.member("hypervolume", one.hypervolume);
+    if (std::isfinite(one.sumOfSquares)) json.member("sum", one.sumOfSquares).member("startSum", one.startSum);
     json.key("parameters").numbers(one.parameters, JsonWriter::Digits::table);
     json.member("termination", one.termination).endObject();
   }

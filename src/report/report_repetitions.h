@@ -24,6 +24,10 @@ struct ReportedRepetition {
   std::string termination;                                        ///< why it stopped
   double start = std::numeric_limits<double>::quiet_NaN();        ///< the least aggregate with which it began
   double hypervolume = std::numeric_limits<double>::quiet_NaN();  ///< of its front; NaN if it finds none
+  /// Of a search that judges sets by them, not by aggregates: that of the best set and the least with which it began;
+  /// NaN of the others.
+  double sumOfSquares = std::numeric_limits<double>::quiet_NaN();
+  double startSum = std::numeric_limits<double>::quiet_NaN();
   int sameAs = 0;  ///< the number of an earlier one that is the same search
 };
 
@@ -38,7 +42,7 @@ struct ReportedRepetitions {
   std::vector<std::string> parameters;
   std::vector<ReportedRepetition> all;
   std::vector<ReportedStretch> stretches;  ///< none: whose evaluations are whose is not known
-  NearlyEqual nearly;                      ///< which aggregates count as equal to the least
+  NearlyEqual nearly;                      ///< which aggregates, or sums, count as equal to the least
   FrontAgreement agreement;                ///< of their fronts; compareFronts()
   double hypervolumeOfAll = std::numeric_limits<double>::quiet_NaN();  ///< of the front of all; likewise
 };

@@ -158,6 +158,8 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
   if (searchHasEnded_ && result.ok()) {
     finalRun_ = result.number;
     compareFinalRun(result);
+  } else if (searchHasEnded_) {
+    warnOfFailedFinalRun(result.failure->reason);
   }
   recordSeries(values, result);
   if (improved_ && best() && best()->number == result.number) improved_(result);
@@ -193,9 +195,23 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   }
 }
 
+int RunReporter::numberOfFinalSet() const {
+  if (finalRunOf_ != 0) return finalRunOf_;
+  return best() ? best()->number : 0;
+}
+
+void RunReporter::warnOfFailedFinalRun(const std::string& reason) {
+  const int number = numberOfFinalSet();
+  if (number == 0) return;
+  urgentWarning(fmt::format(
+      "The final model run has failed, and evaluation No. {} of the same set has not: {}. Its process folder "
+      "lacks the results of the set. With Restart = 1 it is made again",
+      number, reason));
+}
+
 void RunReporter::compareFinalRun(const EvaluationResult& result) {
-  if (finalRunOf_ == 0 && !best()) return;
-  const int number = finalRunOf_ != 0 ? finalRunOf_ : best()->number;
+  const int number = numberOfFinalSet();
+  if (number == 0) return;
   std::string reason;
   const auto row = results_.rowOf(number, reason);
   if (!reason.empty()) {

@@ -131,6 +131,9 @@ class RunReporter final : public EvaluationObserver {
                       std::string_view foundAt);
   void requireLogWritten() const;
   /// Results are right only for a model that gives them again, those of earlier evaluations as well.
+  /// The evaluation whose set the final model run repeats; 0: not known.
+  int numberOfFinalSet() const;
+  void warnOfFailedFinalRun(const std::string& reason);
   void compareFinalRun(const EvaluationResult& result);
   std::string firstDifference(std::span<const double> expected, std::span<const double> found) const;
   void noteReplayWithoutPairs(int number);

@@ -455,6 +455,14 @@ TEST_F(LocalEvaluatorTest, AFinalRunThatDiffersFromItsRowIsToldOf) {
   EXPECT_EQ(observer_.events.back(), "replay 1 a=6 OK");
 }
 
+TEST_F(LocalEvaluatorTest, AFinalRunThatSucceedsWhereItHadFailedIsToldOf) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
+  takeUp({{1, -6.0}});
+  evaluate(makeEvaluator(launcher, 1, 10), {6.0}, DispatchMode::finalRun);
+  EXPECT_THAT(observer_.events, Contains(HasSubstr("No. 1, the final model run, was made again and has succeeded")));
+  EXPECT_EQ(observer_.events.back(), "replay 1 a=6 FAILED");
+}
+
 /// An interrupted run has rows of sets behind one that had not ended.
 TEST_F(LocalEvaluatorTest, AWindowTakesWhatAnEarlierRunHasEvaluated) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });

@@ -120,7 +120,9 @@ TEST_F(GlmRun, KeepsTheSeriesOfItsBestSetThoughAnotherHasTheLeastAggregate) {
     double least = 1e30;
     for (const auto& row : results.rows) least = std::min(least, realCell(row[aggregate]).value());
     EXPECT_GT(realCell(results.rows.back()[aggregate]).value(), least) << "else the test tells nothing";
-    EXPECT_THAT(log(), AllOf(Not(HasSubstr("they were not kept")), HasSubstr("Final model run")));
+    EXPECT_THAT(log(),
+                AllOf(Not(HasSubstr("they were not kept")), HasSubstr("Final model run"),
+                      HasSubstr(fmt::format("The least aggregate, {}, is that of evaluation", formatReal(least)))));
     EXPECT_EQ(best.rows.size(), 365U);
     EXPECT_FALSE(std::isnan(realCell(best.rows.front()[best.column("Best").value()]).value()));
     removeFiles();

@@ -273,8 +273,10 @@ TEST_F(SearchTables, RepetitionsOfParametersWithTheNamesOfColumnsAreRead) {
   all[0] = {.seed = 1, .evaluations = 5, .bestEvaluation = 2, .aggregate = 3.0, .best = {0.25, 0.5}};
   for (const bool hasFronts : {false, true}) {
     if (hasFronts) all[0].front.emplace().hypervolume = 0.5;
+    all[0].sumOfSquares = hasFronts ? std::nan("") : 0.75;
+    all[0].startSum = 0.875;
     for (const std::vector<std::string>& names :
-         {std::vector<std::string>{"Start_Aggregate", "b"}, {"Hypervolume", "Same_As"}, {"Seed", "Seed (2)"}}) {
+         {std::vector<std::string>{"Start_Aggregate", "b"}, {"Hypervolume", "Same_As"}, {"Seed", "Sum_of_Squares"}}) {
       space.names = names;
       write(run_files::kRepetitions, dataTableText(repetitionTable(all, space)));
       const auto found = repetitions(names);
@@ -282,6 +284,9 @@ TEST_F(SearchTables, RepetitionsOfParametersWithTheNamesOfColumnsAreRead) {
       EXPECT_EQ(found->parameters, names);
       EXPECT_THAT(found->all[0].parameters, ElementsAre(0.25, 0.5));
       EXPECT_EQ(std::isfinite(found->all[0].hypervolume), hasFronts);
+      if (hasFronts) continue;
+      EXPECT_EQ(found->all[0].sumOfSquares, 0.75);
+      EXPECT_EQ(found->all[0].startSum, 0.875);
     }
   }
 }
@@ -292,6 +297,7 @@ TEST_F(SearchTables, FrontsOfRepetitionsAreComparedWithThatOfAllOfThem) {
     one.number = one.best = number;
     one.hypervolume = hypervolume;
     one.termination = termination;
+    one.loops = 4;
     return one;
   };
   ReportedRepetitions all;
@@ -311,6 +317,8 @@ TEST_F(SearchTables, FrontsOfRepetitionsAreComparedWithThatOfAllOfThem) {
   EXPECT_THAT(json(), HasSubstr(R"("fronts":{"ofAll":1,"near":2,"verdict":"one set"})"));
   front.ranks = {1, 1};
   EXPECT_THAT(json(), HasSubstr(R"("verdict":"agree")"));
+  for (ReportedRepetition& one : all.all) one.loops = 0;
+  EXPECT_THAT(json(), HasSubstr(R"("verdict":"no search")"));
 }
 
 }  // namespace

@@ -118,6 +118,15 @@ TEST_F(RunReporterTest, AFinalRunWithOtherResultsThanTheBestIsTold) {
   }
 }
 
+TEST_F(RunReporterTest, AFinalRunThatFailsIsTold) {
+  finish(1, 5.0);
+  reporter_.takeBestOf({.best = {0.0}, .bestResult = {.number = 1, .aggregate = 5.0}});
+  finish(2, kFailedRunValue);
+  EXPECT_THAT(state_.log.warnings(),
+              testing::ElementsAre(HasSubstr("The final model run has failed, and evaluation No. 1 of the same set has "
+                                             "not: run.sh exited with code 3")));
+}
+
 TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformationIsSettled) {
   const ObjectiveFunction fit{.name = "fit"};
   ObjectiveAggregator aggregator(std::span(&fit, 1), AggregationMethod::commonDistance);

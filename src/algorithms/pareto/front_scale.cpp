@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <functional>
 
 #include <fmt/format.h>
 
@@ -55,6 +56,13 @@ bool FrontScale::isReferenceUsable() const {
   return std::ranges::all_of(reference_, [](double value) { return value > 0.0; });
 }
 
+bool FrontScale::isBelowReference(std::span<const std::vector<double>> front) const {
+  return std::ranges::any_of(front, [this](const std::vector<double>& values) {
+    const std::vector<double> place = scaled(values);
+    return std::ranges::equal(place, reference_, std::less<>());
+  });
+}
+
 double FrontScale::hypervolumeShare(std::span<const std::vector<double>> front) const {
   if (!isReferenceUsable()) return 0.0;
   double box = 1.0;
@@ -95,7 +103,7 @@ std::vector<std::string> frontCourseLines(const ParetoArchive& archive, std::spa
   const int count = archive.evaluationCount();
   if (archive.members().empty() || count < kFewestEvaluations) return {};
   const FrontScale scale(archive.points(), reference);
-  if (!scale.isReferenceUsable()) return {};
+  if (!scale.isBelowReference(archive.front())) return {};
   const std::string_view whose = isRepetition ? "Course over the evaluations of this repetition" : "Course";
   const std::string last =
       fmt::format("{}evaluation {} of {}", isRepetition ? "its " : "", archive.entries().back().evaluation, count);

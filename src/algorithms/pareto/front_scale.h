@@ -30,13 +30,16 @@ class FrontScale final {
   /// The hypervolume of a front as a share of the box between the ideal point and the reference; 0 if no point is in
   /// it. Of large fronts with many objectives that of mostPointsOfHypervolume() spread over it.
   double hypervolumeShare(std::span<const std::vector<double>> front) const;
-  /// Whether a given reference is greater than the ideal point in every objective.
-  bool isReferenceUsable() const;
+  /// Whether any point of a front is below the reference in every objective; otherwise it has no hypervolume.
+  bool isBelowReference(std::span<const std::vector<double>> front) const;
 
   /// A tenth of the range behind the nadir, so that the ends of the front count.
   static constexpr double kUsualReference = 1.1;
 
  private:
+  /// Whether a given reference is greater than the ideal point in every objective.
+  bool isReferenceUsable() const;
+
   std::vector<double> ideal_;
   std::vector<double> nadir_;
   std::vector<double> reference_;  ///< on this scale

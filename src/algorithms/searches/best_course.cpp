@@ -24,10 +24,14 @@ std::string fallText(double from, double to) {
 
 }  // namespace
 
-void BestCourse::add(double aggregate) {
-  ++evaluationCount_;
-  if (!(aggregate < kFailedRunValue) || (!steps_.empty() && !(aggregate < steps_.back().aggregate))) return;
-  steps_.push_back({evaluationCount_, aggregate});
+void BestCourse::add(double value) {
+  extendTo(evaluationCount_ + 1);
+  improve(evaluationCount_, value);
+}
+
+void BestCourse::improve(int evaluation, double value) {
+  if (!(value < kFailedRunValue) || (!steps_.empty() && !(value < steps_.back().value))) return;
+  steps_.push_back({evaluation, value});
 }
 
 void BestCourse::clear() {
@@ -38,12 +42,12 @@ void BestCourse::clear() {
 double BestCourse::bestAfter(double evaluations) const {
   const auto later = std::upper_bound(steps_.begin(), steps_.end(), evaluations,
                                       [](double count, const Step& step) { return count < step.evaluation; });
-  return later == steps_.begin() ? kFailedRunValue : std::prev(later)->aggregate;
+  return later == steps_.begin() ? kFailedRunValue : std::prev(later)->value;
 }
 
 double BestCourse::expectedFall() const {
   if (steps_.empty()) return 0.0;
-  const double end = steps_.back().aggregate;
+  const double end = steps_.back().value;
   const double half = bestAfter(0.5 * evaluationCount_);
   const double quarter = bestAfter(0.25 * evaluationCount_);
   if (quarter >= kFailedRunValue) return 0.0;
@@ -52,10 +56,11 @@ double BestCourse::expectedFall() const {
   return earlier > later ? later * later / earlier : later;
 }
 
-std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed, bool isRepetition) {
+std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed, bool isRepetition,
+                                     std::string_view value) {
   const int count = course.evaluationCount();
   if (course.steps().empty() || count < kFewestEvaluations) return {};
-  const double best = course.steps().back().aggregate;
+  const double best = course.steps().back().value;
   const double half = course.bestAfter(0.5 * count);
   const double tenth = course.bestAfter(0.9 * count);
   std::vector<std::string> lines;
@@ -64,15 +69,14 @@ std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed
                                         course.steps().back().evaluation, count);
   const std::string_view others = isRepetition ? "the other repetitions" : "other values of Random_Seed";
   if (half >= kFailedRunValue) {
-    lines.push_back(fmt::format("{}: the best value, {}, was {}; none of the first half succeeded", heading,
+    lines.push_back(fmt::format("{}: the {}, {}, was {}; none of the first half succeeded", heading, value,
                                 formatReal(best), found));
   } else if (half == best) {
-    lines.push_back(fmt::format("{}: the best value, {}, was {}; the second half found no better one", heading,
+    lines.push_back(fmt::format("{}: the {}, {}, was {}; the second half found no better one", heading, value,
                                 formatReal(best), found));
   } else {
     lines.push_back(fmt::format(
-        "{}: in the second half of the evaluations the best value fell {}, {}; it was {}", heading,
-        fallText(half, best),
+        "{}: in the second half of the evaluations the {} fell {}, {}; it was {}", heading, value, fallText(half, best),
         tenth == best ? std::string("in the last tenth it did not") : "in the last tenth " + fallText(tenth, best),
         found));
   }
@@ -85,11 +89,11 @@ std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed
   }
   const double fall = course.expectedFall();
   if (half >= kFailedRunValue) return lines;
-  if (fall <= kNoted * std::abs(best)) {
-    lines.push_back(
-        fmt::format("The best value has come to rest. A longer run may yet leave its valley, and {} can tell whether "
-                    "there is a better one elsewhere",
-                    others));
+  if (best == 0.0 || fall <= kNoted * std::abs(best)) {  // sums and squares do not fall below 0
+    lines.push_back(fmt::format(
+        "The {} has come to rest. A longer run may yet leave its valley, and {} can tell whether there is a "
+        "better one elsewhere",
+        value, others));
   } else {
     lines.push_back(fmt::format(
         "If it went on falling as it did, {} more evaluations would bring it to about {:.3g}. Such a trend is "

@@ -6,18 +6,23 @@
 
 namespace mirevo {
 
-/// The best aggregate of a search over its evaluations: how far it moved lately, and what more of them could bring.
+/// The best value of a search over its evaluations: how far it moved lately, and what more of them could bring. The
+/// value is the aggregate, or the sum of squares of a search that judges sets by that.
 class BestCourse final {
  public:
-  /// An evaluation and the best aggregate up to it.
+  /// An evaluation and the best value up to it.
   struct Step {
     int evaluation = 0;
-    double aggregate = 0.0;
+    double value = 0.0;
   };
 
-  /// Takes the aggregate of the next evaluation.
-  void add(double aggregate);
-  /// Starts anew: all aggregates were given another scale.
+  /// Takes the value of the next evaluation.
+  void add(double value);
+  /// Instead of that: so many evaluations have been made,
+  void extendTo(int evaluationCount) { evaluationCount_ = evaluationCount; }
+  /// and this one, behind those that were the best before, is the best of them.
+  void improve(int evaluation, double value);
+  /// Starts anew: all values were given another scale.
   void clear();
 
   int evaluationCount() const { return evaluationCount_; }
@@ -35,8 +40,12 @@ class BestCourse final {
   std::vector<Step> steps_;  ///< those at which the best fell
 };
 
+inline constexpr std::string_view kBestValue = "best value";
+inline constexpr std::string_view kLeastSum = "least sum of squares";
+
 /// Lines for people about a search that has ended. `isBudgetUsed`: it could have gone on. `isRepetition`: it is one of
-/// several with other seeds, and its evaluations are counted for themselves.
-std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed, bool isRepetition = false);
+/// several with other seeds, and its evaluations are counted for themselves. `value`: what the course is of.
+std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed, bool isRepetition = false,
+                                     std::string_view value = kBestValue);
 
 }  // namespace mirevo

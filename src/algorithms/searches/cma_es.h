@@ -116,6 +116,8 @@ class CmaEsMethod final : public PopulationMethod {
   void setVariableCount(std::size_t n) override { variableCount_ = n; }
   std::vector<SearchAdvice> advice(std::size_t n) const override;
   std::int64_t populationSize() const override;
+  /// Its runs end by CmaTests.
+  bool testsPopulationRange() const override { return false; }
   double evaluationsPerLoop() const override { return static_cast<double>(populationSize()); }
   std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
 

@@ -102,6 +102,7 @@ std::vector<std::optional<Glm::Point>> Glm::run(std::span<const ParameterSet> se
       problem_.evaluator.evaluateParameterSets(sets.first(count), DispatchMode::task);
   summary_.evaluationCount += static_cast<int>(count);
   problem_.residuals->evaluationCount = summary_.evaluationCount;
+  summary_.sums->course.extendTo(summary_.evaluationCount);
   if (summary_.evaluationCount == static_cast<int>(count)) problem_.evaluator.settleAggregates(results);
   for (std::size_t i = 0; i < count; ++i) {
     std::optional<Point>& point = points.emplace_back();
@@ -133,13 +134,15 @@ std::vector<std::optional<Glm::Point>> Glm::run(std::span<const ParameterSet> se
                       results[i].number));
       continue;
     }
-    point = Point{sets[i], std::move(results[i]), std::move(rows), squares, sum};
+    const int ordinal = summary_.evaluationCount - static_cast<int>(count - i) + 1;
+    point = Point{sets[i], std::move(results[i]), std::move(rows), squares, sum, ordinal};
   }
   return points;
 }
 
 SearchStatus Glm::initialise() {
   if (!isProblemValid()) return kSearchSettingsInvalid;
+  summary_.sums.emplace();
   InitialSampleSettings sampleSettings = problem_.initialSample;
   if (sampleSettings.generation != SampleGeneration::fromFile) {
     sampleSettings.earlierSetCount = problem_.givenSample.size();
@@ -153,6 +156,7 @@ SearchStatus Glm::initialise() {
   for (std::optional<Point>& point : run(sample)) {
     if (!point) continue;
     noteBest(*point);
+    summary_.sums->start = best_->sum;
     starts_.push_back(*std::move(point));
   }
   std::stable_sort(starts_.begin(), starts_.end(), [](const Point& a, const Point& b) { return a.sum < b.sum; });
@@ -205,7 +209,10 @@ void Glm::noteBest(const Point& point) {
   best_ = point;
   summary_.best = point.set;
   summary_.bestResult = point.result;
-  problem_.residuals->fit = ResidualFit{point.set, point.result.number, {point.rows.values, units_}, differences_};
+  summary_.sums->best = point.sum;
+  summary_.sums->course.improve(point.ordinal, point.sum);
+  problem_.residuals->fit =
+      ResidualFit{point.set, point.result.number, point.sum, {point.rows.values, units_}, differences_};
 }
 
 void Glm::end(std::string message) {

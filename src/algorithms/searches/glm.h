@@ -69,6 +69,7 @@ class Glm final : public SearchAlgorithm {
     ResidualRows rows;
     double squares = 0.0;  ///< of the residuals
     double sum = 0.0;      ///< with the prior
+    int ordinal = 0;       ///< of its evaluation in this search, from 1
   };
 
   /// How a trial set was made.

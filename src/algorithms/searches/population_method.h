@@ -20,7 +20,7 @@ std::optional<SettingRefusal> validateSimplex(const SimplexSettings& simplex, st
 /// What the searches with a population have in common.
 class PopulationMethod : public SearchMethod {
  public:
-  bool testsPopulationRange() const final { return true; }
+  bool testsPopulationRange() const override { return true; }
   bool evaluatesSample(const InitialSampleSettings& sample) const final;
   /// With a raised budget the search continues as if the budget had been that large from the start.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,

@@ -48,6 +48,10 @@ void addObjectives(const std::string& corner, const std::vector<const Repetition
 }
 
 std::string verdictText(const FrontAgreement& agreement, std::span<const double> hypervolumes, double ofAll) {
+  if (agreement.verdict == FrontAgreement::Verdict::noSearch) {
+    return "No repetition had evaluations left after the sets that it began with, so that no search was made: the "
+           "fronts are those of these sets, and tell nothing of it. A larger budget can";
+  }
   if (agreement.verdict == FrontAgreement::Verdict::oneSet) {
     return fmt::format(
         "Whatever the seed, the search found nearly the same single set, within {:g} % of the hypervolume of all, so "
@@ -120,8 +124,10 @@ std::vector<std::string> repeatedFrontLines(std::span<const Repetition> repetiti
   if (!withoutText.empty()) lines.push_back("Warning: " + withoutText);
   std::vector<const Repetition*> ended;
   std::vector<double> hypervolumes;
+  std::int64_t loops = 0;
   for (const Repetition& one : repetitions) {
     if (one.termination.empty() || one.front->size == 0) continue;
+    loops += one.loops;
     ended.push_back(&one);
     hypervolumes.push_back(one.front->hypervolume);
   }
@@ -138,7 +144,7 @@ std::vector<std::string> repeatedFrontLines(std::span<const Repetition> repetiti
        formatTable("Parameters of the compromises", kHeadings, space.names, parameterSpreads(ended, space))) {
     lines.push_back(std::move(line));
   }
-  const FrontAgreement agreement = frontAgreement(hypervolumes, ofAll, ended.front()->front->sizeOfAll);
+  const FrontAgreement agreement = frontAgreement(hypervolumes, ofAll, ended.front()->front->sizeOfAll, loops);
   if (agreement.verdict != FrontAgreement::Verdict::none) {
     lines.push_back(verdictText(agreement, hypervolumes, ofAll));
   }

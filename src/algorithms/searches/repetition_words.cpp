@@ -67,13 +67,20 @@ constexpr double kMostTimes = 100.0;    // of a value above which percents of it
 
 std::vector<std::string> tableLines(std::span<const Repetition> repetitions, std::int32_t planned) {
   std::vector<std::string> lines{repetitionHeading(repetitions.size(), planned)};
-  lines.push_back(fmt::format("   {:>3} {:>11} {:>11} {:>14} {:>14}  {}", "No.", "seed", "evaluations", "best value",
-                              "found by No.", "why it stopped"));
+  const bool hasSums = std::ranges::any_of(repetitions, &Repetition::isJudgedBySums);
+  const auto sumText = [hasSums](const std::string& text) {
+    return hasSums ? fmt::format(" {:>14}", text) : std::string();
+  };
+  lines.push_back(fmt::format("   {:>3} {:>11} {:>11}{} {:>14} {:>14}  {}", "No.", "seed", "evaluations",
+                              sumText("sum of squares"), hasSums ? "aggregate" : "best value", "found by No.",
+                              "why it stopped"));
   int number = 0;
   for (const Repetition& repetition : repetitions) {
     const bool hasBest = repetition.bestEvaluation > 0;
-    lines.push_back(fmt::format("   {:>3} {:>11} {:>11} {:>14} {:>14}  {}", ++number, repetition.seed,
-                                repetition.evaluations, hasBest ? fmt::format("{:.6g}", repetition.aggregate) : "none",
+    const std::string sum = repetition.isJudgedBySums() ? fmt::format("{:.6g}", repetition.sumOfSquares) : "";
+    lines.push_back(fmt::format("   {:>3} {:>11} {:>11}{} {:>14} {:>14}  {}", ++number, repetition.seed,
+                                repetition.evaluations, sumText(sum),
+                                hasBest ? fmt::format("{:.6g}", repetition.aggregate) : "none",
                                 hasBest ? fmt::format("{}", repetition.bestEvaluation) : "", whyItStopped(repetition)));
   }
   return lines;
@@ -81,7 +88,7 @@ std::vector<std::string> tableLines(std::span<const Repetition> repetitions, std
 
 /// Whether it found a set that is better than those that it began with.
 bool hasImproved(const Repetition& repetition) {
-  return !(repetition.aggregate >= repetition.startAggregate);
+  return !(repetition.value() >= repetition.startValue());
 }
 
 class SpreadText final {
@@ -91,21 +98,22 @@ class SpreadText final {
     std::vector<double> values;
     std::vector<double> starts;
     for (const Repetition* repetition : ended_) {
-      values.push_back(repetition->aggregate);
-      starts.push_back(repetition->startAggregate);
+      values.push_back(repetition->value());
+      starts.push_back(repetition->startValue());
     }
     values_ = spreadOf(std::move(values));
     nearly_ = nearlyEqual(values_.least, starts);
     const double most = values_.least + nearly_.tolerance;
     std::ranges::copy_if(ended_, std::back_inserter(near_),
-                         [most](const Repetition* repetition) { return repetition->aggregate <= most; });
+                         [most](const Repetition* repetition) { return repetition->value() <= most; });
     improved_ = static_cast<std::size_t>(
         std::ranges::count_if(ended_, [](const Repetition* repetition) { return hasImproved(*repetition); }));
   }
 
   std::vector<std::string> lines() const {
-    const std::string values = fmt::format("Best values: least {:.6g}, median {:.6g}, greatest {:.6g}", values_.least,
-                                           values_.median, values_.greatest);
+    const std::string values = fmt::format("{}: least {:.6g}, median {:.6g}, greatest {:.6g}",
+                                           ended_.front()->isJudgedBySums() ? "Sums of squares" : "Best values",
+                                           values_.least, values_.median, values_.greatest);
     if (improved_ == 0) return {values, noneImprovedText()};
     std::vector<std::string> lines{
         fmt::format("{}; {} of {} repetitions ended within {}", values, near_.size(), ended_.size(), nearly_.text())};

@@ -54,16 +54,18 @@ NearlyEqual nearlyEqual(double least, std::span<const double> starts) {
   return nearly;
 }
 
-FrontAgreement frontAgreement(std::span<const double> hypervolumes, double ofAll, std::size_t sizeOfAll) {
+FrontAgreement frontAgreement(std::span<const double> hypervolumes, double ofAll, std::size_t sizeOfAll,
+                              std::int64_t loops) {
   using Verdict = FrontAgreement::Verdict;
   const double least = (1.0 - kNearlyEqualShare) * ofAll;
   FrontAgreement found;
   found.near = static_cast<std::size_t>(
       std::ranges::count_if(hypervolumes, [least](double hypervolume) { return hypervolume >= least; }));
   if (hypervolumes.size() < 2 || !(ofAll > 0.0)) return found;
-  found.verdict = found.near < hypervolumes.size() ? Verdict::differ
-                  : sizeOfAll == 1                 ? Verdict::oneSet
-                                                   : Verdict::agree;
+  found.verdict = loops == 0                         ? Verdict::noSearch
+                  : found.near < hypervolumes.size() ? Verdict::differ
+                  : sizeOfAll == 1                   ? Verdict::oneSet
+                                                     : Verdict::agree;
   return found;
 }
 
@@ -84,6 +86,13 @@ DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchS
         "The best evaluation is that of its front that is nearest to the ideal point of the front of all. Hypervolume: "
         "of its front, as a share of the box between that point and the reference point");
     table.columns.emplace_back("Hypervolume");
+  }
+  const bool hasSums = std::ranges::any_of(repetitions, &Repetition::isJudgedBySums);
+  if (hasSums) {
+    table.headLines.emplace_back(
+        "The search judges sets by the sum of squares, not by the aggregate: that of the best set, and the least of "
+        "the sets that it began with; NaN: it had not ended");
+    table.columns.insert(table.columns.end(), {"Sum_of_Squares", "Start_Sum_of_Squares"});
   }
   const std::vector<int> same = sameSearches(repetitions);
   const bool hasSame = std::ranges::any_of(same, [](int other) { return other != 0; });
@@ -111,6 +120,7 @@ DataTable repetitionTable(std::span<const Repetition> repetitions, const SearchS
            std::int64_t{repetition.loops},
            repetition.startAggregate};
     if (hasFronts) row.emplace_back(repetition.front ? repetition.front->hypervolume : 0.0);
+    if (hasSums) row.insert(row.end(), {repetition.sumOfSquares, repetition.startSum});
     if (hasSame) row.emplace_back(std::int64_t{same[i]});
     for (std::size_t k = 0; k < space.size(); ++k) {
       row.emplace_back(repetition.best.empty() ? std::numeric_limits<double>::quiet_NaN()

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cmath>
 #include <cstddef>
 #include <cstdint>
 #include <limits>
@@ -52,17 +53,19 @@ struct RepetitionFront {
 /// What follows from the fronts of the repetitions that have ended with one.
 struct FrontAgreement {
   enum class Verdict : std::uint8_t {
-    none,    ///< nothing to compare: fewer than two fronts, or no hypervolume of all
-    differ,  ///< not all come near the front of all
-    agree,   ///< all do
-    oneSet   ///< all do, and the front of all is a single set, without a trade-off
+    none,     ///< nothing to compare: fewer than two fronts, or no hypervolume of all
+    differ,   ///< not all come near the front of all
+    agree,    ///< all do
+    oneSet,   ///< all do, and the front of all is a single set, without a trade-off
+    noSearch  ///< none went on beyond the sets that it began with
   };
   Verdict verdict = Verdict::none;
   std::size_t near = 0;  ///< fronts within kNearlyEqualShare of the hypervolume of all
 };
 /// `hypervolumes`: of their fronts, on the scale of the front of all; `ofAll` and `sizeOfAll` of that, which may have
-/// sets that none of theirs has; 0 sets: not known.
-FrontAgreement frontAgreement(std::span<const double> hypervolumes, double ofAll, std::size_t sizeOfAll);
+/// sets that none of theirs has; 0 sets: not known. `loops`: that they made in all.
+FrontAgreement frontAgreement(std::span<const double> hypervolumes, double ofAll, std::size_t sizeOfAll,
+                              std::int64_t loops);
 
 /// A repetition as far as it has come. The best set of a search for a front is the set of its front that is nearest to
 /// the ideal point of the front of all repetitions, on the scale of that.
@@ -76,10 +79,19 @@ struct Repetition {
   std::string termination = {};                                 ///< empty until it has ended
   /// The least of the sets that it evaluated before it proposed any; NaN if none of them has succeeded.
   double startAggregate = std::numeric_limits<double>::quiet_NaN();
-  ParameterSet start = {};                    ///< with it; search scale
+  ParameterSet start = {};  ///< with it; search scale
+  /// Of one that has ended and judges sets by them, not by aggregates: that of the best set, and the least of its
+  /// sample; else NaN.
+  double sumOfSquares = std::numeric_limits<double>::quiet_NaN();
+  double startSum = std::numeric_limits<double>::quiet_NaN();
   std::optional<RepetitionFront> front = {};  ///< of a search that finds one
   /// Of one that has ended and drew no random numbers behind its sample: SearchSummary::starts.
   std::vector<ParameterSet> starts = {};
+
+  bool isJudgedBySums() const { return !std::isnan(sumOfSquares); }
+  /// What it has come to, by which it is compared with others, and where it began.
+  double value() const { return isJudgedBySums() ? sumOfSquares : aggregate; }
+  double startValue() const { return isJudgedBySums() ? startSum : startAggregate; }
 };
 
 /// For each the number of the earlier repetition that started from the same sets and that was the same search from

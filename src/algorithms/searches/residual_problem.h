@@ -27,6 +27,7 @@ struct DifferenceJacobian {
 struct ResidualFit {
   ParameterSet set;
   int evaluation = 0;                                  ///< the number of its run
+  double sum = 0.0;                                    ///< of squares, with that of the prior values
   ResidualRows rows;                                   ///< with the finest units of the runs so far
   std::shared_ptr<const DifferenceJacobian> jacobian;  ///< the last one made by differences
 };

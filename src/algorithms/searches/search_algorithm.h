@@ -2,10 +2,13 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <limits>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "algorithms/numbers/search_bounds.h"
+#include "algorithms/searches/best_course.h"
 #include "common/parameter_set.h"
 #include "evaluation/evaluation_result.h"
 
@@ -14,6 +17,13 @@ namespace mirevo {
 /// 0 is success; anything else ends the run.
 using SearchStatus = std::int32_t;
 inline constexpr SearchStatus kSearchOk = 0;
+
+/// How a search that judges sets by sums of squares, and not by aggregates, has come on.
+struct SumsOfSquares {
+  double start = std::numeric_limits<double>::quiet_NaN();  ///< the least of the initial sample
+  double best = std::numeric_limits<double>::quiet_NaN();   ///< of the best set
+  BestCourse course;                                        ///< of the best set's
+};
 
 /// What a search has found so far and why it stopped.
 struct SearchSummary {
@@ -37,6 +47,7 @@ struct SearchSummary {
   /// Search scale; of a search that draws nothing once it has its sample, the sets from which it went on: another that
   /// goes on from the same ones is the same search. Empty of the others.
   std::vector<ParameterSet> starts;
+  std::optional<SumsOfSquares> sums;  ///< of a search that judges sets by them
 };
 
 /// A search in steps: initialise() once, then advance() until isTerminated().

@@ -90,7 +90,7 @@ class SearchMethod {
   virtual std::optional<SettingRefusal> refusalFor(const SearchSpace& /*space*/) const { return std::nullopt; }
   /// The fixed text for a budget below 1, if the search has one of its own.
   virtual std::string_view budgetRefusal() const { return {}; }
-  /// Whether it ends when its population has converged, by the test of the population's range.
+  /// Whether it ends by the tests of its population: its range, and the change of its best value over loops.
   virtual bool testsPopulationRange() const { return false; }
   /// Whether it evaluates a sample from which the scale of the objective functions can be determined.
   virtual bool evaluatesSample(const InitialSampleSettings& sample) const = 0;

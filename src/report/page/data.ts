@@ -291,6 +291,8 @@ export interface Repetition {
   aggregate: Maybe;
   loops: number;
   start: Maybe; // the least aggregate with which it began
+  sum?: Maybe; // of squares, of its best set, where the search judges sets by it and not by the aggregate
+  startSum?: Maybe; // likewise the least with which it began
   hypervolume?: Maybe; // of its front, on the scale of that of all
   sameAs?: number; // an earlier one that started from the same sets and is the same search
   parameters: Maybe[]; // of its best set; of a front, of its compromise
@@ -300,10 +302,10 @@ export interface Repetition {
 export interface Repetitions {
   parameters: string[];
   all: Repetition[];
-  tolerance: number; // above the least aggregate: as good as it
+  tolerance: number; // above the least aggregate, or sum: as good as it
   within: string; // that tolerance in words, "1 % of the least"
   atStart: number; // began as near to the least as that, where these are half of them or more; else 0
-  fronts?: { ofAll: number; near: number; verdict: 'none' | 'differ' | 'agree' | 'one set' }; // how near their fronts come to that of all
+  fronts?: { ofAll: number; near: number; verdict: 'none' | 'differ' | 'agree' | 'one set' | 'no search' }; // how near their fronts come to that of all
   stretches: [number, number, number][]; // repetition, first and last of successive evaluations of it
 }
 

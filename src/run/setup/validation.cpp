@@ -231,11 +231,12 @@ std::optional<SettingRefusal> validateTransformation(const ObjectiveFunction& fu
                                                      bool hasInitialSample) {
   const bool needsScale = method == AggregationMethod::commonDistance || method == AggregationMethod::commonProbability;
   if (!needsScale || hasInitialSample || (function.standardDeviation && function.location)) return std::nullopt;
-  return SettingRefusal{"Error: Standard deviation and location not defined for objective function " + function.name,
-                        function.standardDeviation ? "Location" : "Standard_Deviation",
-                        fmt::format("expected the keyword, which aggregation method {} needs: this run has no initial "
-                                    "sample to take it from",
-                                    static_cast<int>(method))};
+  return SettingRefusal{
+      "Error: Standard deviation and location not defined for objective function " + function.name,
+      function.standardDeviation ? "Location" : "Standard_Deviation",
+      fmt::format("expected the keyword, which aggregation method {} needs: this run does not take it "
+                  "from an initial sample",
+                  static_cast<int>(method))};
 }
 
 std::optional<SettingRefusal> validateProcessCount(const RunConfig& config) {

@@ -314,7 +314,7 @@ void OptimisationTask::requireResiduals(const TaskReading& reading, const SetupS
 
 void OptimisationTask::warnOfOneLoop(const SetupSection& section) const {
   // Then a value is compared with itself.
-  if (method->populationSize() == 0 || method->facts().findsFront || stopping.loopsConvergence != 1 ||
+  if (!method->testsPopulationRange() || method->facts().findsFront || stopping.loopsConvergence != 1 ||
       !(stopping.minChange > 0.0))
     return;
   section.warn(kLoopsKeyword, "with 1 the search ends after its first loop, use at least 2");

@@ -1,6 +1,7 @@
 #include "run/tasks/optimisation_task.h"
 
 #include <algorithm>
+#include <cmath>
 #include <limits>
 #include <span>
 #include <utility>
@@ -21,6 +22,7 @@
 namespace mirevo {
 namespace {
 
+constexpr double kRounding = 1.0e-9;  // share of an aggregate that a function of the same squares may differ by
 constexpr std::string_view kWhatGivenSets = "given sets of the initial sample";
 
 /// Gives every set the value of a failed run, and keeps the sets.
@@ -71,6 +73,22 @@ bool warnOfNoWidth(const TaskContext& context, const SearchSummary& summary, std
       "Parameter_Type = 2",
       summary.returnedCount, summary.replacedCount));
   return true;
+}
+
+/// `course`: of the aggregate.
+std::vector<std::string> courseText(const BestCourse& course, const SearchSummary& summary, bool isRepetition) {
+  const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
+  if (!summary.sums) return courseLines(course, isBudgetUsed, isRepetition);
+  std::vector<std::string> lines = courseLines(summary.sums->course, isBudgetUsed, isRepetition, kLeastSum);
+  if (course.steps().empty()) return lines;
+  const double least = course.steps().back().value;
+  const double ofBest = summary.bestResult.aggregate;
+  if (!(least < ofBest - kRounding * std::abs(ofBest))) return lines;
+  lines.push_back(fmt::format(
+      "The least aggregate, {}, is that of {}evaluation {}; the best set, which is that of the least sum of "
+      "squares, has {}",
+      formatReal(least), isRepetition ? "its " : "", course.steps().back().evaluation, formatReal(ofBest)));
+  return lines;
 }
 
 /// The values of statistics that enter an objective function otherwise than as they are.
@@ -269,7 +287,7 @@ SearchSummary OptimisationTask::searchAll(const TaskContext& context) {
           const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
           logEnd(context, summary,
                  front_ ? frontCourseLines(repeated_->front(index).archive, referencePoint(), isBudgetUsed, true)
-                        : courseLines(course, isBudgetUsed, true));
+                        : courseText(course, summary, true));
           dropFittings();
         });
   }
@@ -278,7 +296,7 @@ SearchSummary OptimisationTask::searchAll(const TaskContext& context) {
       search(context, evaluator, 0, randomSeed, [&context](std::string_view line) { context.log.reportLine(line); });
   context.log.line("");
   const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
-  logEnd(context, summary, front_ ? front_->courseLines(isBudgetUsed) : courseLines(evaluator.course(), isBudgetUsed));
+  logEnd(context, summary, front_ ? front_->courseLines(isBudgetUsed) : courseText(evaluator.course(), summary, false));
   return summary;
 }
 
@@ -287,13 +305,13 @@ const ResidualFitting* OptimisationTask::bestFitting() const {
   return fittings_.empty() ? nullptr : fittings_[repeated_ ? repeated_->bestEnded() : 0].get();
 }
 
-/// Of the repetitions that have derivatives, whether they have ended or not, that with the least aggregate, of equals
-/// the first; 0 of a single search that has them; empty if none has.
-std::optional<std::size_t> OptimisationTask::fittedRepetition(const RepeatedSearch* all) const {
+/// Of the repetitions that have derivatives, whether they have ended or not, that with the least sum of squares, of
+/// equals the first; 0 of a single search that has them; empty if none has.
+std::optional<std::size_t> OptimisationTask::fittedRepetition() const {
   std::optional<std::size_t> best;
   for (std::size_t i = 0; i < fittings_.size(); ++i) {
     if (!fittings_[i] || !fittings_[i]->hasDerivatives()) continue;
-    if (!best || (all != nullptr && all->bestAggregate(i) < all->bestAggregate(*best))) best = i;
+    if (!best || fittings_[i]->sumOfSquares() < fittings_[*best]->sumOfSquares()) best = i;
   }
   return best;
 }
@@ -373,7 +391,7 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
 
 std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext& context,
                                                                const UnfinishedBatch& made) const {
-  std::optional<std::size_t> fitted = fittedRepetition(nullptr);
+  const std::optional<std::size_t> fitted = fittedRepetition();
   std::optional<FrontFinding> front;
   if (front_) front.emplace(*front_);
   if (front && !repeated_ && !hasSearched_) {  // what the search has not taken belongs to its front, too
@@ -387,7 +405,6 @@ std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext
     RepeatedSearch all = *repeated_;
     all.takeUnfinished(context, made, front ? &front->problem().archive : nullptr);
     all.addResults(context, referencePoint(), outcome);
-    fitted = fittedRepetition(&all);
     if (fitted) {
       outcome.report.push_back(
           fmt::format("The covariance is that of repetition {}, the best of those that have derivatives", *fitted + 1));
@@ -401,7 +418,7 @@ std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext
 std::optional<int> OptimisationTask::unfinishedEvaluations(const UnfinishedBatch& made) const {
   if (repeated_) return repeated_->evaluationCountWith(made);
   if (front_) return front_->evaluationCount() + (hasSearched_ ? 0 : static_cast<int>(made.results.size()));
-  const std::optional<std::size_t> fitted = fittedRepetition(nullptr);
+  const std::optional<std::size_t> fitted = fittedRepetition();
   return fitted ? fittings_[*fitted]->problem().evaluationCount : 0;
 }
 

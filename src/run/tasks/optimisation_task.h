@@ -33,7 +33,9 @@ class OptimisationTask final : public Task {
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
   std::optional<OneSlotOnly> needsOneSlot() const override;
-  bool judgesByAggregate() const override { return !method || !method->facts().findsFront; }
+  bool judgesByAggregate() const override {
+    return !method || !(method->facts().findsFront || method->facts().usesResiduals);
+  }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::optional<ParameterSet> trialSet(const SearchSpace& space, const Feasibility& feasibility) const override;
   std::vector<SetDoubt> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
@@ -84,7 +86,7 @@ class OptimisationTask final : public Task {
   SearchSummary searchAll(const TaskContext& context);
   void logEnd(const TaskContext& context, const SearchSummary& summary, const std::vector<std::string>& course) const;
   const ResidualFitting* bestFitting() const;
-  std::optional<std::size_t> fittedRepetition(const RepeatedSearch* all) const;
+  std::optional<std::size_t> fittedRepetition() const;
   void dropFittings();
   void requireResiduals(const TaskReading& reading, const SetupSection& section) const;
   std::span<const double> referencePoint() const;

@@ -265,7 +265,7 @@ void FrontFinding::addFront(const TaskContext& context, int best, TaskOutcome& o
                     best == chosen.number ? ", and the suggested one" : ", another point of the trade-off"));
   }
   if (!settings_.referencePoint.empty() &&
-      !FrontScale(problem_.archive.points(), settings_.referencePoint).isReferenceUsable()) {
+      !FrontScale(problem_.archive.points(), settings_.referencePoint).isBelowReference(problem_.archive.front())) {
     lines.push_back(fmt::format("Warning: No hypervolume: the front is nowhere below {}", kReferencePointKeyword));
   }
   outcome.tables.push_back(frontTable(context));

@@ -276,10 +276,15 @@ void RepeatedSearch::end(std::size_t index, const SearchSummary& summary) {
     own.bestEvaluation = summary.bestResult.number;
     own.aggregate = summary.bestResult.aggregate;
     own.best = summary.best;
+    if (summary.sums) {
+      own.sumOfSquares = summary.sums->best;
+      own.startSum = summary.sums->start;
+    }
   }
+  const auto valueOf = [](const SearchSummary& one) { return one.sums ? one.sums->best : one.bestResult.aggregate; };
   const bool isFirst = best_.best.empty();
-  const double before = best_.bestResult.aggregate;
-  const double now = summary.bestResult.aggregate;
+  const double before = valueOf(best_);
+  const double now = valueOf(summary);
   // Side by side a later one may have ended before.
   const bool isRescue = !best_.failure.empty() && summary.failure.empty();
   const bool isBetter = isRescue || (summary.failure.empty() && summary.bestResult.ok() &&

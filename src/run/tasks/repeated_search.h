@@ -44,7 +44,7 @@ class RepeatedSearch final {
  public:
   /// The search with this 0-based index and seed, from its start to its end.
   using Search = std::function<SearchSummary(Evaluator&, std::size_t index, std::int32_t seed, const PeriodicStep&)>;
-  /// Called when a repetition has ended, with its index and the course of its best value.
+  /// Called when a repetition has ended, with its index and the course of its best aggregate.
   using Ended = std::function<void(std::size_t index, const SearchSummary&, const BestCourse&)>;
 
   RepeatedSearch(const RepetitionSettings& settings, std::int32_t seed) : settings_(settings), seed_(seed) {}
@@ -66,8 +66,6 @@ class RepeatedSearch final {
   /// The index of the best repetition of those that have ended, of equals the first; 0 if none has.
   std::size_t bestEnded() const { return bestEnded_; }
   bool hasEnded(std::size_t index) const;
-  /// The best value of one that has begun; NaN if none of its evaluations has succeeded.
-  double bestAggregate(std::size_t index) const { return repetitions_[index].aggregate; }
   /// Evaluations whose results they have after takeUnfinished().
   int evaluationCountWith(const UnfinishedBatch& made) const;
 

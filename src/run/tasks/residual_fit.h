@@ -1,5 +1,6 @@
 #pragma once
 
+#include <limits>
 #include <memory>
 #include <optional>
 
@@ -21,6 +22,7 @@ class ResidualFitting final {
 
   /// Adds lines and tables to the outcome. Without a fit that has derivatives it adds the reason alone.
   void addCovariance(const TaskContext& context, TaskOutcome& outcome) const;
+  double sumOfSquares() const { return problem_.fit ? problem_.fit->sum : std::numeric_limits<double>::infinity(); }
   bool hasDerivatives() const { return problem_.fit && problem_.fit->jacobian; }
   /// Names measures that are no function of the sum of squares; empty if all are.
   std::optional<std::string> otherMeasuresText(const TaskContext& context) const;

@@ -79,6 +79,8 @@ TEST(BestCourse, OfARepetitionIsCountedForItselfAndHeldAgainstTheOthers) {
 
 TEST(BestCourse, APositiveValueIsNotExpectedToFallBelowZero) {
   EXPECT_THAT(textOf(stepsOf(8.0, 4.0, 1.0), true), HasSubstr("about 0. Such"));
+  EXPECT_THAT(textOf(stepsOf(3.0, 1.0, 0.0), true),
+              AllOf(HasSubstr("fell from 1 to 0, "), HasSubstr("has come to rest"), Not(HasSubstr("about"))));
 }
 
 TEST(BestCourse, BeginsAnewWithAnotherScale) {

@@ -291,18 +291,21 @@ TEST(Repetitions, ThatTheirFrontsAreSingleSetsDoesNotMakeThemTheSame) {
     std::size_t sizeOfAll;
     Verdict verdict;
     const char* text;
+    int loops = 9;
   } cases[] = {{{0.0, 0.091, 0.091}, 0.174, 2, Verdict::differ, "not found the same front each time: 0 of 3"},
                {{0.34, 0.94, 1.0}, 1.0, 1, Verdict::differ, "1 of 3 repetitions come within 1 % of the hypervolume"},
                {{0.995, 1.0}, 1.0, 1, Verdict::oneSet, "found nearly the same single set, within 1 %"},
                {{0.995, 1.0}, 1.0, 3, Verdict::agree, "Whatever the seed, the search found nearly the same front:"},
                {{1.0, 1.0}, 1.0, 0, Verdict::agree, "nearly the same front:"},
                {{0.0, 0.0}, 0.0, 1, Verdict::none, "of all 0\n"},
-               {{1.0}, 1.0, 1, Verdict::none, "why it stopped"}};
+               {{1.0}, 1.0, 1, Verdict::none, "why it stopped"},
+               {{1.0, 1.0}, 1.0, 3, Verdict::noSearch, "so that no search was made", 0}};
   for (const auto& one : cases) {
-    EXPECT_EQ(frontAgreement(one.hypervolumes, one.ofAll, one.sizeOfAll).verdict, one.verdict) << one.text;
+    EXPECT_EQ(frontAgreement(one.hypervolumes, one.ofAll, one.sizeOfAll, one.loops).verdict, one.verdict) << one.text;
     std::vector<std::pair<double, ParameterSet>> best(one.hypervolumes.size(), {1.0, {1.0, 0.0}});
     std::vector<Repetition> all = repetitionsOf(best);
     for (std::size_t i = 0; i < all.size(); ++i) {
+      all[i].loops = one.loops;
       all[i].front = {one.hypervolumes[i], 1, 0, {0.0, 0.0}, {0.0, 0.0}, one.ofAll, one.sizeOfAll};
     }
     const std::string text = spreadText(all);
@@ -311,6 +314,26 @@ TEST(Repetitions, ThatTheirFrontsAreSingleSetsDoesNotMakeThemTheSame) {
     EXPECT_EQ(text.find("Whatever the seed") != std::string::npos, isSame) << text;
     EXPECT_EQ(text.find("no trade-off") != std::string::npos, one.verdict == Verdict::oneSet) << text;
   }
+}
+
+/// Sets with smaller sums of squares than where they began, and greater aggregates.
+TEST(Repetitions, ThatAreJudgedBySumsOfSquaresAreComparedByThem) {
+  std::vector<Repetition> all = repetitionsOf({{0.4, {1.0, 0.0}}, {0.5, {1.0, 0.0}}, {0.2, {4.0, 0.0}}}, 0.3);
+  for (std::size_t i = 0; i < all.size(); ++i) {
+    all[i].sumOfSquares = i < 2 ? 0.0620 : 0.0701;
+    all[i].startSum = i < 2 ? 0.09 : 0.0701;
+  }
+  const std::string text = spreadText(all);
+  EXPECT_THAT(text, AllOf(HasSubstr("evaluations sum of squares      aggregate   found by No."),
+                          HasSubstr("        100          0.062            0.4             10"),
+                          HasSubstr("Sums of squares: least 0.062, median 0.062, greatest 0.0701; 2 of 3 repetitions"),
+                          HasSubstr("1 of 3 repetitions found nothing better than what they began with"),
+                          Not(HasSubstr("Best values"))));
+  all.back().termination.clear();
+  all.back().sumOfSquares = all.back().startSum = std::nan("");
+  const std::string table = dataTableText(repetitionTable(all, repeatedSpace()));
+  EXPECT_THAT(table, AllOf(HasSubstr("\tStart_Aggregate\tSum_of_Squares\tStart_Sum_of_Squares\ta\tk\t"),
+                           HasSubstr("\t0.3\t0.062\t0.09\t1\t1\t"), HasSubstr("\t0.3\tNaN\tNaN\t4\t1\t\n")));
 }
 
 TEST(Repetitions, OneThatHasNotEndedOrHasNoResultHasItsRowAndNoShareInTheSpread) {

@@ -203,6 +203,7 @@ test('repetitions that agree in a single set, or in what they began with, are no
   atStart.repetitions.atStart = 2;
   for (const [data, text, kind, absent] of [
     [fronts(1, 'differ'), '1 of 3 repetitions come within 1 % of the hypervolume of all', 'warning', 'single set, and'],
+    [fronts(3, 'no search'), 'No repetition had evaluations left', 'warning', 'hatever the seed'],
     [fronts(3, 'one set'), 'It is a single set, and whatever the seed', '', 'depends on the seed'],
     [atStart, '2 of 3 repetitions began with a value within 1 % of the least already', 'warning', 'agree in']]) {
     await withReport(data, {}, async (page) => {
@@ -226,7 +227,14 @@ test('repetitions that have not ended, or have no result, are told of and not co
     data.repetitions.all[1].sameAs = 1;
     return data;
   };
+  // They began with a smaller aggregate, and with a greater sum of squares, by which they are judged.
+  const ofSums = (data) => {
+    data.repetitions.tolerance = 0.1;
+    for (const one of data.repetitions.all) Object.assign(one, { start: one.aggregate / 2, sum: 10 * one.number, startSum: 25 });
+    return data;
+  };
   for (const [data, texts] of [
+    [ofSums(sample.withTables(2)), ['The sums of squares of 3 repetitions: least 10, median 20, greatest 30', '1 of 3 repetitions ended within', '1 repetition found nothing better']],
     [withSame(sample.withTables(2)), ['The best aggregates of 2 repetitions', '1 of 2 repetitions ended within', 'Repetition 2 is the same search as 1: they started from the same sets, and count once']],
     [cut(sample.withTables(2)), ['The best aggregates of 1 repetition', '1 repetition found no value.', '1 repetition had not ended.']],
     [cut(sample.withTables(4)), ['the fronts of the 1 that has ended with one, on its scale: least 1.5, median 1.5, greatest 1.5', '1 repetition found no front.', '1 repetition had not ended.']]]) {

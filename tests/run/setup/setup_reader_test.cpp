@@ -373,6 +373,9 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1 & Min_Change = 0.005 => "
        "Min_Change = 0.005\nMin_Population_Range = 1e-8",
        "Min_Population_Range: has no effect: Dynamically Dimensioned Search does not test the range of a population"},
+      {"Algorithm_Type = 1 => 'CMA-ES' & Use_Surrogate_Model = 1 => 0 & No_Loops_Convergence = 12 => 1 & Min_Change = "
+       "0.005 => Min_Change = 0.005\nMin_Population_Range = 1e-8",
+       "Min_Population_Range: has no effect: "},
       {"Neighbourhood_Size = 60 => Neighbourhood_Size = 60\nCheck_Interval = 3", ""},
       {"Neighbourhood_Size = 60 => Neighbourhood_Size = 60\nCheck_Interval = 3 & Use_Surrogate_Model = 1 => 0",
        "Check_Interval: has no effect without Use_Surrogate_Model = 1"},

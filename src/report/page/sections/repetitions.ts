@@ -18,10 +18,15 @@ const nameOf = ({ seed, number: of }: Repetition) => `repetition ${of} (seed ${s
 const endedOf = (all: readonly Repetition[]) => all.filter(({ best, termination, aggregate, hypervolume }) => best > 0 && termination !== '' && (aggregate !== null || hypervolume != null));
 /** The same search counts once; as in the log, the others are told of, but not compared. */
 const compared = (all: readonly Repetition[]) => endedOf(all).filter(({ sameAs }) => !sameAs);
-const least = (all: readonly Repetition[]) => finite(all.map(({ aggregate }) => aggregate)).reduce((a, b) => Math.min(a, b), Infinity);
+/** What it is judged by. */
+const valueOf = ({ aggregate, sum }: Repetition) => sum ?? aggregate;
+const startOf = ({ start, sum, startSum }: Repetition) => (sum != null ? startSum ?? null : start);
+const least = (all: readonly Repetition[]) => finite(all.map(valueOf)).reduce((a, b) => Math.min(a, b), Infinity);
+/** Of a search that judges sets by the sum of squares. */
+const hasSums = (all: readonly Repetition[]) => all.some(({ sum }) => sum != null);
 
 /** Whether its best value is as good as the least of all. */
-const isNear = ({ tolerance }: Repetitions, one: Repetition, best: number) => one.termination !== '' && one.aggregate !== null && one.aggregate <= best + tolerance;
+const isNear = ({ tolerance }: Repetitions, one: Repetition, best: number) => one.termination !== '' && valueOf(one) !== null && valueOf(one)! <= best + tolerance;
 
 /** Whether a front was searched for, and no best value. */
 const findsFronts = ({ all }: Repetitions) => all.some(({ hypervolume }) => hypervolume !== undefined);
@@ -62,19 +67,19 @@ function othersThan(all: readonly Repetition[], what: string): Finding[] {
 
 function findings(data: ReportData, repetitions: Repetitions): Finding[] {
   const ended = compared(repetitions.all);
-  const values = sorted(ended.map(({ aggregate }) => aggregate));
+  const values = sorted(ended.map(valueOf));
   const others = othersThan(repetitions.all, 'value');
   if (values.length === 0) return others;
   const best = values[0]!;
   const near = ended.filter((one) => isNear(repetitions, one, best));
-  const stuck = ended.filter(({ aggregate, start }) => aggregate !== null && start !== null && aggregate >= start);
+  const stuck = ended.filter((one) => valueOf(one) !== null && startOf(one) !== null && valueOf(one)! >= startOf(one)!);
   const { atStart } = repetitions;
   const isAgreed = 2 * near.length > ended.length;
   if (ended.length > 1 && stuck.length === values.length) {
     return [{ kind: 'warning', text: `None of ${counted(ended.length, 'repetition')} found anything better than what it began with, which says nothing of a minimum: the start may be one, or the search does not get away from it.` }, ...others];
   }
   const found: Finding[] = [
-    { text: `The best aggregates of ${counted(ended.length, 'repetition')}: least ${number(best, 6)}, median ${number(quantile(values, 0.5), 6)}, greatest ${number(values[values.length - 1], 6)}.` },
+    { text: `${hasSums(ended) ? 'The sums of squares' : 'The best aggregates'} of ${counted(ended.length, 'repetition')}: least ${number(best, 6)}, median ${number(quantile(values, 0.5), 6)}, greatest ${number(values[values.length - 1], 6)}.` },
     ...(ended.length < 2 ? [] : [{ ...(isAgreed && atStart > 0 ? {} : { kind: isAgreed ? 'good' as const : 'warning' as const }), text: `${count(near.length)} of ${counted(ended.length, 'repetition')} ended within ${repetitions.within} value.${
       isAgreed ? '' : ' What the search finds depends on the seed: a larger budget helps, or taking the best of several repetitions, as here.'}` }]),
   ];
@@ -103,7 +108,7 @@ function frontFindings({ all, fronts }: Repetitions): Finding[] {
   const { ofAll, near, verdict } = fronts;
   return [
     { text: `The front above is that of all ${counted(all.length, 'repetition')} together. The hypervolumes of ${ended.length === all.length ? 'their own fronts' : `the fronts of the ${count(ended.length)} that ${ended.length === 1 ? 'has' : 'have'} ended with one`}, on its scale: least ${number(volumes[0], 6)}, median ${number(quantile(volumes, 0.5), 6)}, greatest ${number(greatest, 6)}; that of all ${number(ofAll, 6)}.` },
-    ...(verdict === 'none' ? [] : verdict === 'one set' ? [{ text: `It is a single set, and whatever the seed, the search came within ${percent(kNear)} of its hypervolume, so that there is no trade-off to compare.` }] : [verdict === 'agree'
+    ...(verdict === 'none' ? [] : verdict === 'no search' ? [{ kind: 'warning' as const, text: 'No repetition had evaluations left after the sets that it began with, so that no search was made: the fronts are those of these sets, and tell nothing of it. A larger budget can.' }] : verdict === 'one set' ? [{ text: `It is a single set, and whatever the seed, the search came within ${percent(kNear)} of its hypervolume, so that there is no trade-off to compare.` }] : [verdict === 'agree'
       ? { kind: 'good' as const, text: `Whatever the seed, the search found nearly the same front: each hypervolume is within ${percent(kNear)} of that of all.` }
       : { kind: 'warning' as const, text: `${count(near)} of ${counted(ended.length, 'repetition')} come within ${percent(kNear)} of the hypervolume of all: the front that a single search finds depends on the seed. A larger budget helps, or taking the front of several repetitions, as here.` }]),
     ...others,
@@ -188,20 +193,23 @@ function volumePlan({ all }: Repetitions): ChartPlan {
 
 function bestPlan(repetitions: Repetitions, best: number): ChartPlan {
   const { all, tolerance, within } = repetitions;
-  const order = all.filter(({ aggregate }) => aggregate !== null).sort((a, b) => a.aggregate! - b.aggregate!);
+  const isOfSums = hasSums(all);
+  const shownOf = isOfSums ? ({ sum }: Repetition) => sum ?? null : ({ aggregate }: Repetition) => aggregate;
+  const order = all.filter((one) => shownOf(one) !== null).sort((a, b) => shownOf(a)! - shownOf(b)!);
+  const what = isOfSums ? 'sum of squares' : 'best aggregate';
   const isNamed = order.length <= kMostRows;
   return {
-    title: 'The best aggregate of each repetition',
+    title: `The ${what} of each repetition`,
     note: `From the least to the greatest. Within the shaded part they are within ${within}.`,
     height: 56 + Math.max(6, Math.min(26, 900 / order.length)) * order.length,
     switches: best > 0 ? [{ key: 'log', label: 'Log' }] : [],
     option: (look, is) => ({
       grid: { left: 24, right: 24, top: 4, bottom: 16 },
-      xAxis: axis(look, { ...(is('log') ? logRange([order.map(({ aggregate }) => aggregate)]) : { boundaryGap: ['3%', '3%'] }), ...(is('log') ? {} : { axisLabel: { showMinLabel: false, showMaxLabel: false } }) }),
+      xAxis: axis(look, { ...(is('log') ? logRange([order.map(shownOf)]) : { boundaryGap: ['3%', '3%'] }), ...(is('log') ? {} : { axisLabel: { showMinLabel: false, showMaxLabel: false } }) }),
       yAxis: axis(look, { type: 'category', data: order.map(nameOf), inverse: true, axisTick: { show: false }, axisLabel: { show: isNamed, color: look.ink, interval: 0 } }),
-      tooltip: tooltip(look, { formatter: (dot: { value: [number, string] }) => tip(dot.value[1], [['best aggregate', number(dot.value[0], 6)]]) }),
+      tooltip: tooltip(look, { formatter: (dot: { value: [number, string] }) => tip(dot.value[1], [[what, number(dot.value[0], 6)]]) }),
       series: [{
-        type: 'scatter', symbolSize: isNamed ? 9 : 5, data: order.map((one) => ({ value: [one.aggregate, nameOf(one)], itemStyle: { color: isNear(repetitions, one, best) ? look.best : look.dots } })),
+        type: 'scatter', symbolSize: isNamed ? 9 : 5, data: order.map((one) => ({ value: [shownOf(one), nameOf(one)], itemStyle: { color: isNear(repetitions, one, best) ? look.best : look.dots } })),
         markArea: { silent: true, itemStyle: { color: look.band, opacity: 0.15 }, data: [[{ xAxis: best }, { xAxis: best + tolerance }]] },
       }],
     }),
@@ -272,13 +280,14 @@ export function repetitionSection(data: ReportData): Section | null {
   const { all, parameters } = repetitions;
   const best = least(compared(all));
   const courses = coursesOf(data, repetitions);
-  const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), number(one.aggregate, 6), count(one.best), one.termination ? count(one.loops) : '', whyItEnded(one)]);
+  const isOfSums = hasSums(all);
+  const rows = all.map((one) => [count(one.number), String(one.seed), count(one.evaluations), ...(isOfSums ? [number(one.sum ?? null, 6)] : []), number(one.aggregate, 6), count(one.best), one.termination ? count(one.loops) : '', whyItEnded(one)]);
   return {
     id: 'repetitions',
     title: kTitle,
     content: [
       findingList(findings(data, repetitions)),
-      table([{ title: 'Repetition' }, { title: 'Seed', number: true }, { title: 'Evaluations', number: true }, { title: 'Best aggregate', number: true },
+      table([{ title: 'Repetition' }, { title: 'Seed', number: true }, { title: 'Evaluations', number: true }, ...(isOfSums ? [{ title: 'Sum of squares', number: true }] : []), { title: isOfSums ? 'Aggregate' : 'Best aggregate', number: true },
         { title: 'Found by', number: true, hint: 'The evaluation' }, { title: 'Loops', number: true }, { title: 'Why it stopped' }], rows, 'Repetitions'),
       ...(courses.length > 0 ? [heading('Courses'), chart(coursePlan(courses))] : []),
       ...(Number.isFinite(best) && all.length > 1 ? [heading('Spread'), chart(bestPlan(repetitions, best)),
